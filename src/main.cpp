@@ -1,0 +1,3 @@
+#include "control/driver.hpp"
+
+int main(int argc, char** argv) { return vhd::RunVantorHD(argc, argv); }
