@@ -36,7 +36,9 @@ struct SktArg {
 // Loads the setup file; when create_log, also creates the log file (named
 // from the setup file and the process id). Unreadable file or syntax error:
 // the run stops with the system's message.
-void SktOpenFile(const std::string& name, bool create_log, int process_id = -1);
+// With status: an unreadable file gives status -1 (else 0) and no stop, so
+// that the caller can report it in its own words.
+void SktOpenFile(const std::string& name, bool create_log, int process_id = -1, int* status = nullptr);
 void SktClose();
 bool SktIsOpen();
 const std::string& SktFilePath();
@@ -64,7 +66,19 @@ int SktLevel();                  // 0 for a target
 std::string SktSectionPath();    // "VantorHD/HYDRODYNAMIC_MODULE/TIME"
 
 // Keyword readers. The default (when given) is stored first; a keyword found
-// in the current section has parameter arg.param read into value.
+// in the current section has parameter arg.param read into value, and the
+// read is logged (" (default)" when the keyword is absent).
+//   - An absent keyword without a default leaves the value as the caller set
+//     it, sets the flag to 1 and writes no log line; the caller decides
+//     whether that is an error.
+//   - Integers are read from TOML integers only (never from a float or a
+//     boolean); reals from integers or floats; logicals from booleans or
+//     integers (non-zero is true); texts and file names from strings. inf and
+//     nan are refused, as are values outside the range of the type.
+//   - A keyword given as an array of arrays holds instances: instance k is
+//     the k-th inner array ("point = [[1.0, 2.0], [3.0, 4.0]]").
+//   - A missing parameter or instance of a keyword that is present is a
+//     read error like a wrong type; an array reader wants exactly n values.
 void SktReadKeyword(std::string_view key, int& value, std::optional<int> def = {}, SktArg arg = {});
 void SktReadKeyword(std::string_view key, float& value, std::optional<float> def = {}, SktArg arg = {});
 void SktReadKeyword(std::string_view key, double& value, std::optional<double> def = {}, SktArg arg = {});
@@ -82,7 +96,9 @@ void SktReadKeyword(std::string_view key, std::vector<double>& values, int n,
                     std::optional<std::vector<double>> def = {}, SktArg arg = {});
 
 // After all module setups: a warning for every keyword of an opened section
-// that no reader asked for, naming its path and line.
+// that no reader asked for, naming its path and line, and for the parameters
+// of a keyword that no reader read ("dt = [30, 40]" read as one value).
+// Sections never opened are not reported.
 void SktReportUnusedKeywords();
 
 }  // namespace vhd

@@ -29,29 +29,21 @@ std::string_view TrimRight(std::string_view text) {
   return end == std::string_view::npos ? std::string_view{} : text.substr(0, end + 1);
 }
 
+void WriteLine(std::FILE* out, std::string_view prefix, std::string_view line) {
+  const std::string record = std::string(prefix).append(line).append("\n");
+  std::fwrite(record.data(), 1, record.size(), out);
+  std::fflush(out);
+}
+
 // One record: to the log as it is, or to standard output with one leading
 // blank when no log is open. Every record is flushed so that the log is
 // complete up to the last line whatever ends the process.
 void WriteRecord(std::string_view line) {
   LogState& s = State();
-  if (s.file) {
-    std::fwrite(line.data(), 1, line.size(), s.file);
-    std::fputc('\n', s.file);
-    std::fflush(s.file);
-  } else {
-    std::fputc(' ', stdout);
-    std::fwrite(line.data(), 1, line.size(), stdout);
-    std::fputc('\n', stdout);
-    std::fflush(stdout);
-  }
+  WriteLine(s.file ? s.file : stdout, s.file ? "" : " ", line);
 }
 
-void ShowToUser(std::string_view line) {
-  std::fputc(' ', stdout);
-  std::fwrite(line.data(), 1, line.size(), stdout);
-  std::fputc('\n', stdout);
-  std::fflush(stdout);
-}
+void ShowToUser(std::string_view line) { WriteLine(stdout, " ", line); }
 
 bool NightBuild() {
   const char* mode = std::getenv("BUILDMODE");

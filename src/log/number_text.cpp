@@ -2,6 +2,7 @@
 
 #include <fmt/core.h>
 
+#include <algorithm>
 #include <charconv>
 #include <cmath>
 #include <string>
@@ -67,29 +68,24 @@ std::string Substitute(std::string_view templ, std::string_view value) {
   return out;
 }
 
+// The text of x before it is right-adjusted.
+std::string PlainNumberText(double x, int w) {
+  if (std::isnan(x)) return "NaN";
+  if (std::isinf(x)) return x > 0 ? "Infinity" : "-Infinity";
+  const double ax = std::fabs(x);
+  if (ax <= 1e-100) return "0";
+  const double hi = std::pow(10.0, w - 1) - 1.0;
+  const double lo = 1.0 / std::pow(10.0, w - 4);
+  if (ax >= hi || ax <= lo) return ExponentText(x);
+  if (ax < 1.0) return FractionText(x);
+  return FixedText(x);
+}
+
 }  // namespace
 
 std::string NumberText(double x, int w) {
-  w = w < 1 ? 1 : (w > 20 ? 20 : w);
-  std::string text;
-  const double ax = std::fabs(x);
-  if (std::isnan(x)) {
-    text = "NaN";
-  } else if (std::isinf(x)) {
-    text = x > 0 ? "Infinity" : "-Infinity";
-  } else if (ax <= 1e-100) {
-    text = "0";
-  } else {
-    const double hi = std::pow(10.0, w - 1) - 1.0;
-    const double lo = 1.0 / std::pow(10.0, w - 4);
-    if (ax >= hi || ax <= lo) {
-      text = ExponentText(x);
-    } else if (ax < 1.0) {
-      text = FractionText(x);
-    } else {
-      text = FixedText(x);
-    }
-  }
+  w = std::clamp(w, 1, 20);
+  std::string text = PlainNumberText(x, w);
   // Right-adjusted in w characters; a longer text is kept whole rather than cut.
   if (static_cast<int>(text.size()) < w) text.insert(0, w - text.size(), ' ');
   return text;
