@@ -1,0 +1,74 @@
+#include <string>
+
+#include "control/minimal_hd.hpp"
+#include "control/module.hpp"
+#include "log/log.hpp"
+
+namespace vhd {
+
+std::string_view ModuleKindName(ModuleKind kind) {
+  static constexpr std::string_view kNames[kModuleKinds] = {"HD", "TR", "ST", "MT", "VT", "PT"};
+  return kNames[static_cast<int>(kind)];
+}
+
+std::string_view ModuleModeKeyword(ModuleKind kind) {
+  static constexpr std::string_view kKeys[kModuleKinds] = {
+      "mode_of_hydrodynamic_module",   "mode_of_transport_module",
+      "mode_of_sand_transport_module", "mode_of_mud_transport_module",
+      "mode_of_vitrax_module",         "mode_of_particle_tracking_module"};
+  return kKeys[static_cast<int>(kind)];
+}
+
+namespace {
+
+std::string_view ModuleTitle(ModuleKind kind) {
+  static constexpr std::string_view kTitles[kModuleKinds] = {"hydrodynamic",   "transport",
+                                                             "sand transport", "mud transport",
+                                                             "ecological",     "particle tracking"};
+  return kTitles[static_cast<int>(kind)];
+}
+
+}  // namespace
+
+int ModuleMode(const ModuleSelection& s, ModuleKind kind) {
+  switch (kind) {
+    case ModuleKind::HD:
+      return s.hd;
+    case ModuleKind::TR:
+      return s.tr;
+    case ModuleKind::ST:
+      return s.st;
+    case ModuleKind::MT:
+      return s.mt;
+    case ModuleKind::VT:
+      return s.vt;
+    case ModuleKind::PT:
+      return s.pt;
+  }
+  return 0;
+}
+
+std::unique_ptr<Module> CreateModule(ModuleKind kind, int /*mode*/) {
+  switch (kind) {
+    case ModuleKind::HD:
+      return std::make_unique<MinimalHdModule>();
+    default:
+      return nullptr;
+  }
+}
+
+void SetupModules(ModuleSet& modules, const ModuleContext& context) {
+  for (const ModuleKind kind : kSetupOrder) {
+    const int mode = ModuleMode(context.selection, kind);
+    if (mode <= 0) continue;
+    std::unique_ptr<Module> module = CreateModule(kind, mode);
+    if (!module)
+      FatalError("MODULE_SELECTION: " + std::string(ModuleModeKeyword(kind)) + " = " +
+                 std::to_string(mode) + ", but this build has no " +
+                 std::string(ModuleTitle(kind)) + " module");
+    module->Setup(context);
+    modules.Set(kind, std::move(module));
+  }
+}
+
+}  // namespace vhd

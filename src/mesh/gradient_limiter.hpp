@@ -1,0 +1,80 @@
+#pragma once
+// Gradient limiters: scale or replace an element's unlimited gradient so that
+// the values reconstructed at its face centres create no new extrema.
+//
+// Limiter codes of the schemes: 0 none, 1 ENO, 2 weighted ("simple"),
+// 3 Barth-Jespersen.
+//
+//  Barth-Jespersen: with phi_max, phi_min the extremes of phi over e and its
+//    active face neighbours, and for each face with an active neighbour the
+//    extrapolated increment D = g . (x_f - x_e):
+//      alpha_f = min(1, (phi_max - phi_e)/D) if D > eps,
+//                min(1, (phi_min - phi_e)/D) if D < -eps, else 1;
+//    the limited gradient is min_f(alpha_f) g. Faces without an active
+//    neighbour (boundary, dry) neither widen the bounds nor limit, so an
+//    element whose neighbours are all dry keeps its gradient.
+//  ENO: of e's own gradient and the gradients of its valid face neighbours
+//    (a face without a valid neighbour offers e's own gradient again), the one
+//    of smallest magnitude; a candidate replaces the choice only when strictly
+//    smaller, so ties keep e's own gradient or the earlier face.
+//  Weighted: candidates g_i as for ENO, one per face (e's own gradient stands
+//    for a face without a valid neighbour); with s_i = |g_i|^2 / 2 the weight
+//    of candidate i is the product of the other candidates' s_j plus 1e-4, and
+//    the limited gradient is sum w_i g_i / sum w_i. On a triangle with three
+//    valid neighbours these are the classic three-gradient weights; a
+//    quadrilateral uses its four candidates (products of three); an element
+//    with fewer valid neighbours mixes its own gradient in for the missing
+//    ones, and one with none keeps its own gradient.
+//
+// A neighbour is active when its element flag equals 1 (the wet code: 1 wet,
+// 0 dry, 2 flooded); a valid neighbour (ENO, weighted) is active, e itself is
+// active and the face flag is positive. Empty flag arrays mean "all active" /
+// "all open". Inactive elements keep their gradient unchanged.
+//
+// Threads: static OpenMP loops over the owned elements, each writing only its
+// own outputs; no allocation, callable in the time loop outside a parallel
+// region. Barth-Jespersen may limit in place (output arrays = input arrays);
+// ENO and the weighted limiter read the neighbours' unlimited gradients and
+// need separate output arrays.
+
+#include "core/array1.hpp"
+#include "mesh/mesh.hpp"
+
+namespace vhd {
+
+inline constexpr int kLimiterNone = 0;
+inline constexpr int kLimiterENO = 1;
+inline constexpr int kLimiterWeighted = 2;
+inline constexpr int kLimiterBarthJespersen = 3;
+
+void CALCLIMITEDGRADIENTBJ2D(const Mesh& mesh, const Array1<double>& phi, const Array1<int>& element_flags,
+                             const Array1<double>& gx_in, const Array1<double>& gy_in, Array1<double>& gx_out,
+                             Array1<double>& gy_out, double eps);
+void CALCLIMITEDGRADIENTBJ3D(const Mesh& mesh, const Array1<double>& phi, const Array1<int>& element_flags,
+                             const Array1<double>& gx_in, const Array1<double>& gy_in, const Array1<double>& gz_in,
+                             Array1<double>& gx_out, Array1<double>& gy_out, Array1<double>& gz_out, double eps);
+
+void CALCLIMITEDGRADIENTENO2D(const Mesh& mesh, const Array1<int>& element_flags, const Array1<int>& face_flags,
+                              const Array1<double>& gx_in, const Array1<double>& gy_in, Array1<double>& gx_out,
+                              Array1<double>& gy_out);
+void CALCLIMITEDGRADIENTENO3D(const Mesh& mesh, const Array1<int>& element_flags, const Array1<int>& face_flags,
+                              const Array1<double>& gx_in, const Array1<double>& gy_in,
+                              const Array1<double>& gz_in, Array1<double>& gx_out, Array1<double>& gy_out,
+                              Array1<double>& gz_out);
+
+void CALCLIMITEDGRADIENTSIMPLE2D(const Mesh& mesh, const Array1<int>& element_flags, const Array1<int>& face_flags,
+                                 const Array1<double>& gx_in, const Array1<double>& gy_in, Array1<double>& gx_out,
+                                 Array1<double>& gy_out);
+
+// The limiter chosen by its code (0 copies the gradient). An unknown code
+// stops the run with "Type not supported for gradient limiter".
+void CALCLIMITEDGRADIENT2D(int code, const Mesh& mesh, const Array1<double>& phi, const Array1<int>& element_flags,
+                           const Array1<int>& face_flags, const Array1<double>& gx_in, const Array1<double>& gy_in,
+                           Array1<double>& gx_out, Array1<double>& gy_out, double eps);
+// Code 2 is the fatal error "Simple limiter not implemented in 3D".
+void CALCLIMITEDGRADIENT3D(int code, const Mesh& mesh, const Array1<double>& phi, const Array1<int>& element_flags,
+                           const Array1<int>& face_flags, const Array1<double>& gx_in, const Array1<double>& gy_in,
+                           const Array1<double>& gz_in, Array1<double>& gx_out, Array1<double>& gy_out,
+                           Array1<double>& gz_out, double eps);
+
+}  // namespace vhd
