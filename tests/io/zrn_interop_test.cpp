@@ -1,0 +1,266 @@
+// Files of the data-file layer against other netCDF readers and writers:
+// Debian's python3-netCDF4 and xarray (/usr/bin/python3), and the raw
+// netCDF library for the layout rules other tools depend on.
+
+#include <gtest/gtest.h>
+#include <netcdf.h>
+
+#include <cstdlib>
+#include <filesystem>
+#include <string>
+#include <vector>
+
+#include "io/units.hpp"
+#include "io/zrn.hpp"
+#include "test_support.hpp"
+
+namespace vhd {
+namespace {
+
+constexpr const char* kPython = "/usr/bin/python3";
+
+// Runs a Python script with arguments; returns its exit status and output.
+int RunPython(const test::TempDir& dir, const std::string& script, const std::string& args,
+              std::string& output) {
+  const std::string path = dir.file("script.py");
+  const std::string log = dir.file("script.out");
+  test::WriteTextFile(path, script);
+  const int rc = std::system((std::string(kPython) + " " + path + " " + args + " > " + log + " 2>&1").c_str());
+  output = test::ReadTextFile(log);
+  return rc;
+}
+
+bool HavePython() { return std::filesystem::exists(kPython); }
+
+// A .zrn0 with two items over 4 half-hour steps; item k at step s holds k + s/4.
+void WriteSeries(const std::string& name) {
+  ZrnFile f;
+  zrnHeaderCreate(f, name, kZrnFileData, "Interop series");
+  zrnSetEqCalendarAxis(f, ZrnDateTime{2004, 1, 1, 0, 0, 0}, 1800.0);
+  zrnSetItemInfo(f, 1, "Surface elevation", kUvqIWaterLevel, kUvqUmeter);
+  zrnSetItemAxisEqD0(f, 1);
+  zrnSetItemInfo(f, 2, "Discharge", kUvqIDischarge, kUvqUm3PerSec, kZrnDouble);
+  zrnSetItemAxisEqD0(f, 2);
+  zrnFileCreate(f, true);
+  for (int s = 0; s < 4; ++s)
+    for (int k = 1; k <= 2; ++k) {
+      const double v = k + s / 4.0;
+      zrnWriteItemTimeStep(f, 0, &v, 1);
+    }
+  zrnFileClose(f);
+}
+
+TEST(ZrnInterop, EveryAttributeIsTextNeverString) {
+  test::TempDir dir;
+  const std::string name = dir.file("attrs.zrn0");
+  WriteSeries(name);
+  int ncid, nvars;
+  ASSERT_EQ(nc_open(name.c_str(), NC_NOWRITE, &ncid), NC_NOERR);
+  nc_inq_nvars(ncid, &nvars);
+  for (int v = -1; v < nvars; ++v) {
+    int natts = 0;
+    nc_inq_varnatts(ncid, v, &natts);
+    for (int a = 0; a < natts; ++a) {
+      char att[NC_MAX_NAME + 1];
+      nc_type type;
+      nc_inq_attname(ncid, v, a, att);
+      nc_inq_atttype(ncid, v, att, &type);
+      EXPECT_NE(type, NC_STRING) << "variable " << v << " attribute " << att;
+    }
+  }
+  int format = 0;
+  nc_inq_format(ncid, &format);
+  EXPECT_EQ(format, NC_FORMAT_NETCDF4_CLASSIC);
+  nc_close(ncid);
+}
+
+TEST(ZrnInterop, PythonNetcdf4ReadsASeriesWithCfTime) {
+  if (!HavePython()) GTEST_SKIP() << kPython << " not found";
+  test::TempDir dir;
+  const std::string name = dir.file("series.zrn0");
+  WriteSeries(name);
+  const std::string script = R"(
+import sys, datetime
+import netCDF4
+ds = netCDF4.Dataset(sys.argv[1])
+t = ds.variables["time"]
+assert t.units == "seconds since 2004-01-01 00:00:00", t.units
+assert t.calendar == "standard"
+dates = netCDF4.num2date(t[:], t.units, t.calendar)
+want = [datetime.datetime(2004, 1, 1, 0, 0) + datetime.timedelta(minutes=30 * s) for s in range(4)]
+assert [str(d) for d in dates] == [str(w) for w in want], dates
+h = ds.variables["surface_elevation"]
+q = ds.variables["discharge"]
+assert h.long_name == "Surface elevation" and h.units == "m"
+assert q.units == "m3 s-1"
+for s in range(4):
+    assert abs(h[s] - (1 + s / 4)) < 1e-6, h[:]
+    assert q[s] == 2 + s / 4, q[:]
+assert ds.Conventions == "CF-1.8"
+print("ok")
+)";
+  std::string out;
+  EXPECT_EQ(RunPython(dir, script, name, out), 0) << out;
+}
+
+TEST(ZrnInterop, PythonReadsFlushedStepsWhileTheRunStillWrites) {
+  if (!HavePython()) GTEST_SKIP() << kPython << " not found";
+  test::TempDir dir;
+  const std::string name = dir.file("live.zrn0");
+  ZrnFile f;
+  zrnHeaderCreate(f, name, kZrnFileData, "live");
+  zrnSetEqCalendarAxis(f, ZrnDateTime{2004, 1, 1, 0, 0, 0}, 60.0);
+  zrnSetItemInfo(f, 1, "Level", kUvqIWaterLevel, kUvqUmeter, kZrnDouble);
+  zrnSetItemAxisEqD0(f, 1);
+  ASSERT_EQ(zrnFileCreate(f, true), 0);
+  for (int s = 0; s < 3; ++s) {
+    const double v = 0.5 * s;
+    zrnWriteItemTimeStep(f, 0, &v, 1);
+  }
+  const std::string script = R"(
+import sys
+import netCDF4
+ds = netCDF4.Dataset(sys.argv[1])
+v = ds.variables["level"][:]
+assert len(v) == 3, v
+assert list(v) == [0.0, 0.5, 1.0], v
+print("ok")
+)";
+  std::string out;
+  EXPECT_EQ(RunPython(dir, script, name, out), 0) << out;
+  zrnFileClose(f);
+}
+
+TEST(ZrnInterop, CfSeriesWrittenByPythonReadsBackWithTheSameValues) {
+  if (!HavePython()) GTEST_SKIP() << kPython << " not found";
+  test::TempDir dir;
+  const std::string name = dir.file("python.nc");
+  const std::string script = R"(
+import sys
+import numpy as np
+import netCDF4
+ds = netCDF4.Dataset(sys.argv[1], "w")
+ds.createDimension("time", None)
+t = ds.createVariable("time", "f8", ("time",))
+t.units = "minutes since 2011-07-15 06:30:00"
+t.calendar = "gregorian"
+t[:] = [0, 10, 20, 30, 40]
+a = ds.createVariable("temp", "f4", ("time",), fill_value=-99.0)
+a.units = "degC"
+a.standard_name = "sea_water_temperature"
+a[:] = np.ma.masked_array([12.5, 13.0, 0.0, 14.0, 14.25], mask=[0, 0, 1, 0, 0])
+b = ds.createVariable("wind", "f8", ("time",))
+b.long_name = "Wind speed at 10 m"
+b.units = "knot"
+b[:] = [1.0, 2.0, 4.0, 8.0, 16.0]
+ds.close()
+print("ok")
+)";
+  std::string out;
+  ASSERT_EQ(RunPython(dir, script, name, out), 0) << out;
+
+  ZrnFile r;
+  ASSERT_EQ(zrnFileRead(r, name), 0);
+  ZrnDateTime start;
+  double dt = 0;
+  int n = 0;
+  ASSERT_EQ(zrnGetEqCalendarAxis(r, start, dt, n), 0);
+  EXPECT_EQ(zrnDateTimeText(start), "2011-07-15 06:30:00");
+  EXPECT_EQ(dt, 600.0);
+  EXPECT_EQ(n, 5);
+  ASSERT_EQ(r.items.size(), 2u);
+  EXPECT_EQ(r.items[0].item_type, kUvqITemperature);
+  EXPECT_EQ(r.items[0].unit, kUvqUdegreeCelsius);
+  EXPECT_EQ(r.items[1].name, "Wind speed at 10 m");
+  EXPECT_EQ(r.items[1].unit, kUvqUknot);
+  const double want_a[5] = {12.5, 13.0, kZrnDefaultDeleteValue, 14.0, 14.25};
+  const double want_b[5] = {1.0, 2.0, 4.0, 8.0, 16.0};
+  for (int s = 0; s < n; ++s) {
+    double a = 0, b = 0, t = 0;
+    int item = 0;
+    ASSERT_EQ(zrnReadItemTimeStep(r, item, t, &a, 1), 0);
+    ASSERT_EQ(zrnReadItemTimeStep(r, item, t, &b, 1), 0);
+    EXPECT_EQ(t, 600.0 * s);
+    EXPECT_EQ(a, want_a[s]) << s;
+    EXPECT_EQ(b, want_b[s]) << s;
+  }
+  EXPECT_EQ(ZrnCheckItemUnit(r, 2, kUvqIWindSpeed), 0);
+  zrnFileClose(r);
+}
+
+TEST(ZrnInterop, XarrayOpensAMeshFile) {
+  if (!HavePython()) GTEST_SKIP() << kPython << " not found";
+  test::TempDir dir;
+  const std::string name = dir.file("mesh.zrnu");
+  // Two triangles forming the unit square.
+  ZrnMeshData m;
+  m.x.assign(4);
+  m.y.assign(4);
+  m.z.assign(4);
+  m.node_id.assign(4);
+  m.node_code.assign(4);
+  const double xs[] = {0, 1, 1, 0}, ys[] = {0, 0, 1, 1};
+  for (int i = 1; i <= 4; ++i) {
+    m.x[i] = 500000.0 + xs[i - 1];
+    m.y[i] = 6000000.0 + ys[i - 1];
+    m.z[i] = -2.0;
+    m.node_id[i] = i;
+    m.node_code[i] = 1;
+  }
+  m.element_id.assign(2);
+  m.element_type.assign(2);
+  m.node_start.assign(3);
+  m.node_list.assign(6);
+  const int list[] = {1, 2, 3, 1, 3, 4};
+  for (int j = 1; j <= 6; ++j) m.node_list[j] = list[j - 1];
+  m.node_start[1] = 1;
+  m.node_start[2] = 4;
+  m.node_start[3] = 7;
+  for (int e = 1; e <= 2; ++e) {
+    m.element_id[e] = e;
+    m.element_type[e] = 21;
+  }
+  ZrnFile f;
+  zrnHeaderCreate(f, name, kZrnFileMesh2D, "mesh");
+  zrnSetGeoInfoUTMProj(f, "UTM-32", 0, 0, 0);
+  ASSERT_EQ(zrnSetMesh(f, m), 0);
+  zrnSetEqCalendarAxis(f, ZrnDateTime{2004, 1, 1, 0, 0, 0}, 60.0);
+  zrnSetItemInfo(f, 1, "Surface elevation", kUvqIWaterLevel, kUvqUmeter);
+  zrnSetItemAxisEqD4(f, 1, kZrnLocationFace, 2);
+  ASSERT_EQ(zrnFileCreate(f), 0);
+  for (int s = 0; s < 3; ++s) {
+    const double v[2] = {0.1 * s, -0.1 * s};
+    zrnWriteItemTimeStep(f, 0, v, 2);
+  }
+  zrnFileClose(f);
+
+  const std::string script = R"(
+import sys
+import numpy as np
+import xarray as xr
+ds = xr.open_dataset(sys.argv[1])
+assert ds.sizes["mesh2d_nFaces"] == 2 and ds.sizes["mesh2d_nNodes"] == 4, ds.sizes
+assert ds.sizes["time"] == 3
+topo = ds["mesh2d"].attrs
+assert topo["cf_role"] == "mesh_topology" and topo["topology_dimension"] == 2
+assert topo["node_coordinates"] == "mesh2d_node_x mesh2d_node_y"
+fn = ds["mesh2d_face_nodes"].values
+assert fn.shape == (2, 3), fn.shape
+assert fn.tolist() == [[0, 1, 2], [0, 2, 3]], fn
+eta = ds["surface_elevation"]
+assert eta.dims == ("time", "mesh2d_nFaces"), eta.dims
+assert eta.attrs["location"] == "face" and eta.attrs["mesh"] == "mesh2d"
+assert eta.attrs["grid_mapping"] == "crs"
+assert np.allclose(eta.values[2], [0.2, -0.2])
+assert str(ds["time"].values[1])[:19] == "2004-01-01T00:01:00", ds["time"].values
+assert int(ds["crs"].attrs["epsg"]) == 32632
+assert ds["crs"].attrs["EPSG_code"] == "EPSG:32632"
+assert "location" not in ds["mesh2d_node_x"].attrs
+print("ok")
+)";
+  std::string out;
+  EXPECT_EQ(RunPython(dir, script, name, out), 0) << out;
+}
+
+}  // namespace
+}  // namespace vhd
