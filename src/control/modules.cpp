@@ -1,6 +1,6 @@
 #include <string>
 
-#include "control/minimal_hd.hpp"
+#include "control/hd_driver_module.hpp"
 #include "control/module.hpp"
 #include "log/log.hpp"
 
@@ -51,7 +51,7 @@ int ModuleMode(const ModuleSelection& s, ModuleKind kind) {
 std::unique_ptr<Module> CreateModule(ModuleKind kind, int /*mode*/) {
   switch (kind) {
     case ModuleKind::HD:
-      return std::make_unique<MinimalHdModule>();
+      return std::make_unique<HdDriverModule>();
     default:
       return nullptr;
   }

@@ -324,6 +324,8 @@ struct HdModule {
 // the HD timing set. The setup file's target must be the current section.
 // meshes are the run's meshes (indices of SPACE count from 1 into it).
 void SetupHD(HdModule& hd, const RunControl& run, const TimeAxis& time, const ModuleSelection& modules,
+             const std::vector<const Mesh*>& meshes);
+void SetupHD(HdModule& hd, const RunControl& run, const TimeAxis& time, const ModuleSelection& modules,
              const std::vector<Mesh>& meshes);
 
 // Section readers called by SetupHD, in this order; each opens and closes its
@@ -331,7 +333,7 @@ void SetupHD(HdModule& hd, const RunControl& run, const TimeAxis& time, const Mo
 void SetupEquationHD(HdModule& hd);
 // Legacy formulation codes: 4 is read as 1; in 3D also 5 as 3 and 6 as 2.
 int MapFormulationHD(int formulation, int ndim);
-void SetupSpaceHD(HdModule& hd, const std::vector<Mesh>& meshes);
+void SetupSpaceHD(HdModule& hd, const std::vector<const Mesh*>& meshes);
 void SetupFloodDryHD(HdModule& hd);
 void SetupEddy(HdModule& hd, const Mesh& mesh);
 void SetupBedResistanceHD(HdModule& hd, const Mesh& mesh);

@@ -44,6 +44,13 @@ void ReadMeshIndex(std::string_view key, int& index, int nmeshes) {
 
 void SetupHD(HdModule& hd, const RunControl& run, const TimeAxis& time, const ModuleSelection& modules,
              const std::vector<Mesh>& meshes) {
+  std::vector<const Mesh*> pointers;
+  for (const Mesh& m : meshes) pointers.push_back(&m);
+  SetupHD(hd, run, time, modules, pointers);
+}
+
+void SetupHD(HdModule& hd, const RunControl& run, const TimeAxis& time, const ModuleSelection& modules,
+             const std::vector<const Mesh*>& meshes) {
   hd.overall_dt = time.dt;
   hd.time_axis = time;
   hd.process_id = run.process_id;
@@ -64,7 +71,7 @@ void SetupHD(HdModule& hd, const RunControl& run, const TimeAxis& time, const Mo
                "(depth-integrated) equations only - set number_of_dimensions = 2 in DOMAIN");
   }
   SetupSpaceHD(hd, meshes);
-  const Mesh& mesh = meshes[static_cast<std::size_t>(hd.number_of_2D_mesh_velocity - 1)];
+  const Mesh& mesh = *meshes[static_cast<std::size_t>(hd.number_of_2D_mesh_velocity - 1)];
   AllocateStateHD(hd, mesh);
   SetupFloodDryHD(hd);
   SetupEddy(hd, mesh);
@@ -100,7 +107,7 @@ void SetupEquationHD(HdModule& hd) {
   if (open) SktCloseSection();
 }
 
-void SetupSpaceHD(HdModule& hd, const std::vector<Mesh>& meshes) {
+void SetupSpaceHD(HdModule& hd, const std::vector<const Mesh*>& meshes) {
   const int n = static_cast<int>(meshes.size());
   if (n < 1) FatalError("SetupSpaceHD: the run has no mesh");
   if (OpenOptionalSectionHD("SPACE")) {
@@ -112,10 +119,10 @@ void SetupSpaceHD(HdModule& hd, const std::vector<Mesh>& meshes) {
   const bool same = hd.number_of_2D_mesh_geometry == hd.number_of_2D_mesh_velocity &&
                     hd.number_of_2D_mesh_velocity == hd.number_of_2D_mesh_elevation;
   hd.mesh_flag = same ? 2 : 1;
-  const Mesh& geometry = meshes[static_cast<std::size_t>(hd.number_of_2D_mesh_geometry - 1)];
+  const Mesh& geometry = *meshes[static_cast<std::size_t>(hd.number_of_2D_mesh_geometry - 1)];
   hd.projection = IsGeographic(geometry.projection) ? 2 : 1;
   hd.metric_radius = hd.projection == 2 ? kPhysical.earth_radius : 1.0;
-  const Mesh& velocity = meshes[static_cast<std::size_t>(hd.number_of_2D_mesh_velocity - 1)];
+  const Mesh& velocity = *meshes[static_cast<std::size_t>(hd.number_of_2D_mesh_velocity - 1)];
   if (velocity.ndim != 2 || velocity.elements.nelements < 1) {
     FatalError("SetupSpaceHD: mesh " + std::to_string(hd.number_of_2D_mesh_velocity) +
                " (number_of_2D_mesh_velocity) is not a 2D mesh with elements");

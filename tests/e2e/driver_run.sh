@@ -11,7 +11,8 @@ status_is 0 $? "zero steps"
 contains "$d/setup.log" "= COMPUTATION STARTED ="
 contains "$d/setup.log" "= COMPUTATION ENDED ="
 contains "$d/setup.log" "  Normal run completion"
-contains "$d/setup.log" "Hydrodynamic module: minimal module (flow not computed)"
+contains "$d/setup.log" "Section: HYDRODYNAMIC_MODULE"
+contains "$d/setup.log" "Number of time steps"
 
 # Three steps of 30 s from 2004-02-28 23:59:00 (a leap year): the message
 # file holds the records of the start, the start of the loop and the last

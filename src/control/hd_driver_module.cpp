@@ -1,0 +1,40 @@
+#include "control/hd_driver_module.hpp"
+
+#include <vector>
+
+#include "hydro/time_step.hpp"
+#include "log/log.hpp"
+
+namespace vhd {
+
+void HdDriverModule::Setup(const ModuleContext& context) {
+  std::vector<const Mesh*> meshes;
+  for (const DomainMesh& dm : context.domain.meshes) meshes.push_back(&dm.mesh);
+  SetupHD(hd_, context.run, context.time, context.selection, meshes);
+  mesh_ = meshes[static_cast<std::size_t>(hd_.number_of_2D_mesh_velocity - 1)];
+  SetupSolverHD(hd_, *mesh_, solver_);
+}
+
+void HdDriverModule::InitialStep(double /*t*/, int& /*run_status*/) {
+  InitialiseStateHD(hd_, *mesh_);
+  InitialStepHD(hd_, solver_, *mesh_);
+}
+
+double HdDriverModule::TimeStep(double t, double t_end) {
+  return CALCTIMESTEPHD(hd_, solver_, *mesh_, t, t_end);
+}
+
+void HdDriverModule::Step(const StepTimes& times, int& run_status) {
+  // The driver hands the time reached at the end of the sub-step.
+  StepHD(hd_, solver_, *mesh_, times.t - times.dt, times.dt, run_status);
+}
+
+void HdDriverModule::PrintStatistics() { PrintTimeStepStatisticsHD(hd_); }
+
+void HdDriverModule::PrintTimings() { vhd::PrintTimings(hd_.timing); }
+
+double HdDriverModule::MeshSizeFigure() const {
+  return mesh_ ? static_cast<double>(mesh_->elements.nelements) : 0.0;
+}
+
+}  // namespace vhd
