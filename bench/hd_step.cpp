@@ -1,0 +1,135 @@
+// HD sub-steps on generated meshes: element-stage updates per second, peak
+// memory per element and the share of the memory bandwidth of a STREAM-like
+// triad measured in the same run.
+//
+//   bench_hd_step [--benchmark_filter=...]
+// Counters: Melem_stages_per_s (elements x stages / s), GBps_triad. Memory
+// per element: run one 1,000,000-element case under /usr/bin/time -v and
+// divide its maximum resident set by the element count.
+
+#include <benchmark/benchmark.h>
+
+#include <cmath>
+#include <map>
+#include <memory>
+#include <vector>
+
+#include "core/omp.hpp"
+#include "hydro/hd_module.hpp"
+#include "hydro/sw_fluxes.hpp"
+#include "hydro/time_step.hpp"
+#include "log/log.hpp"
+#include "mesh/generate.hpp"
+#include "mesh/mesh.hpp"
+
+namespace {
+
+using namespace vhd;
+
+struct Case {
+  Mesh mesh;
+  HdModule hd;
+  HdSolver solver;
+};
+
+// A square basin of random jittered triangles (2 n^2 elements) with a
+// sloping bed and a tilted surface, so that every face carries flow.
+std::unique_ptr<Case> MakeCase(int elements, int order) {
+  auto c = std::make_unique<Case>();
+  RectangleMeshSpec spec;
+  const int n = static_cast<int>(std::lround(std::sqrt(elements / 2.0)));
+  spec.nx = spec.ny = n;
+  spec.x1 = spec.y1 = n * 10.0;
+  spec.layout = CellLayout::kRandomTriangles;
+  spec.jitter = 0.2;
+  spec.bed = [](double x, double) { return -5.0 - 1e-4 * x; };
+  GenerateRectangleMesh(spec, c->mesh);
+  SetupMeshGeometry(c->mesh);
+  HdModule& hd = c->hd;
+  hd.bed.type = kBedNone;
+  hd.eddy.horizontal.type = kEddyNone;
+  hd.time_step.dt_max_HD = 1e9;
+  hd.time_step.CFL_critical_HD = 0.8;
+  hd.flood_dry.elevation_limit = 1e6;
+  HdSolutionTechnique& s = hd.solution;
+  s.type_of_Riemann_solver = 1;
+  s.scheme_of_space_discretization_horizontal = order;
+  s.scheme_of_time_integration = order;
+  s.face_value_limiter = order == 2 ? 2 : 0;
+  s.gradient_limiter = order == 2 ? 3 : 0;
+  s.preserve_dU = order == 2;
+  s.face_average_d = order == 2 ? 1 : 0;
+  s.face_limit_dry = order == 2;
+  AllocateStateHD(hd, c->mesh);
+  HdState& st = hd.state;
+  for (int e = 1; e <= st.nelements; ++e) {
+    st.eta[e] = 0.1 * std::sin(c->mesh.elements.xc[e] / spec.x1 * 6.283);
+    st.h[e] = st.eta[e] + st.d[e];
+  }
+  InitialFloodDryCodesHD(hd, c->mesh);
+  SetupSolverHD(hd, c->mesh, c->solver);
+  InitialStepHD(hd, c->solver, c->mesh);
+  return c;
+}
+
+// Triad a = b + s c over arrays far larger than the caches (GB/s, counting
+// 3 x 8 bytes per entry).
+double TriadBandwidth() {
+  static double best = 0;
+  if (best > 0) return best;
+  const int n = 4'000'000;  // 96 MB, far beyond the caches
+  std::vector<double> a(n, 0.0), b(n, 1.0), c(n, 2.0);
+  for (int rep = 0; rep < 10; ++rep) {
+    const double t0 = WallSeconds();
+    double* pa = a.data();
+    const double* pb = b.data();
+    const double* pc = c.data();
+    VHD_OMP_PARALLEL_FOR
+    for (int i = 0; i < n; ++i) pa[i] = pb[i] + 3.0 * pc[i];
+    const double t = WallSeconds() - t0;
+    best = std::max(best, 3.0 * 8.0 * n / t / 1e9);
+  }
+  benchmark::DoNotOptimize(a.data());
+  return best;
+}
+
+void BM_HdStep(benchmark::State& state) {
+  const int elements = static_cast<int>(state.range(0));
+  const int order = static_cast<int>(state.range(1));
+  const int threads = static_cast<int>(state.range(2));
+  OmpSetThreads(threads);
+  const double triad = TriadBandwidth();
+  auto c = MakeCase(elements, order);
+  int status = 0;
+  double t = 0;
+  for (auto _ : state) {
+    const double dt = CALCTIMESTEPHD(c->hd, c->solver, c->mesh, t, t + 1e9);
+    StepHD(c->hd, c->solver, c->mesh, t, dt, status);
+    t += dt;
+  }
+  const int ne = c->hd.state.nelements;
+  const double stages = order == 2 ? 2.0 : 1.0;
+  state.counters["Melem_stages_per_s"] =
+      benchmark::Counter(ne * stages * 1e-6, benchmark::Counter::kIsIterationInvariantRate);
+  state.counters["GBps_triad"] = triad;
+  state.counters["elements"] = ne;
+  OmpSetThreads(1);
+}
+
+BENCHMARK(BM_HdStep)
+    ->ArgNames({"elements", "order", "threads"})
+    ->Args({100'000, 1, 1})
+    ->Args({100'000, 1, 2})
+    ->Args({100'000, 2, 1})
+    ->Args({100'000, 2, 2})
+    ->Args({1'000'000, 1, 1})
+    ->Args({1'000'000, 1, 2})
+    ->Args({1'000'000, 2, 1})
+    ->Args({1'000'000, 2, 2})
+    ->Unit(benchmark::kMillisecond)
+    ->UseRealTime()
+    ->MinTime(2.0);
+
+}  // namespace
+
+BENCHMARK_MAIN();

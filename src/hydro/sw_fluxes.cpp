@@ -1,0 +1,508 @@
+#include "hydro/sw_fluxes.hpp"
+
+#include <algorithm>
+#include <cmath>
+#include <numbers>
+#include <string>
+
+#include "core/omp.hpp"
+#include "log/log.hpp"
+
+namespace vhd {
+
+namespace {
+
+// Settings and pointers read by the face loop, gathered once per stage.
+struct FaceLoopInput {
+  const int* e1;
+  const int* e2;
+  const double *nx, *ny, *len;
+  const double *eta, *d, *h, *P, *Q;
+  const int* code;
+  const double* k;
+  const double* face_d;
+  bool second;
+  const double *rx1, *ry1, *rx2, *ry2;
+  const double *eta_x, *eta_y, *P_x, *P_y, *Q_x, *Q_y;
+  bool eddy;
+  const double *nu, *ux, *uy, *vx, *vy;
+  double h_min, g;
+  int solver, entropy_fix, fad, land_condition, face_value_limiter;
+  bool preserve_dU, face_limit_dry;
+};
+
+double Clip(double value, double a, double b) {
+  return std::min(std::max(value, std::min(a, b)), std::max(a, b));
+}
+
+// Face values of one side.
+struct SideValues {
+  double eta, P, Q;  // reconstructed (or centre) values
+  double d, h;       // still water depth and depth passed to the flux
+};
+
+// Face d and face depth of a side from the face still water depth d_f: the
+// depth is max(0, eta + d_f), and where the surface lies below the face bed
+// the side's d is raised to -eta with it, so that the pre-balanced pressure
+// g/2 (h^2 - d^2) stays zero for a surface at rest at datum.
+inline void FaceDepth(SideValues& side, double df) {
+  side.d = std::max(df, -side.eta);
+  side.h = side.eta + side.d;
+}
+
+// Depth at a reflecting wall from the outgoing Riemann invariant
+// u_n + 2 sqrt(g h) (land condition 2), else the face depth itself.
+double WallDepth(int land_condition, double un, double h, double k, double g) {
+  if (land_condition == 2 && h > 0) {
+    // (max(0, u_n + 2c))^2 / (4 g) written as h (1 + u_n / 2c)^2, which is h
+    // itself to the last bit for water at rest.
+    const double r = std::max(0.0, 1.0 + un / (2.0 * std::sqrt(g * h)));
+    return h * r * r;
+  }
+  return h + k;
+}
+
+// Diffusive momentum flux of the eddy viscosity through a face of normal n,
+// times the face length.
+void EddyFlux(double nu, double hf, double ux, double uy, double vx, double vy, double nx, double ny,
+              double len, double& Dx, double& Dy) {
+  const double shear = uy + vx;
+  Dx = hf * nu * (2.0 * ux * nx + shear * ny) * len;
+  Dy = hf * nu * (shear * nx + 2.0 * vy * ny) * len;
+}
+
+void ZeroFace(HdSolver& s, int f) {
+  s.f_mass[f] = s.f_mx1[f] = s.f_my1[f] = s.f_mx2[f] = s.f_my2[f] = 0.0;
+}
+
+// One interior face: classification, reconstruction, flux and the signed
+// contributions of each side.
+inline void InteriorFace(const FaceLoopInput& in, HdSolver& s, double* face_flux, double* face_flux_len,
+                         int f) {
+  const int L = in.e1[f], R = in.e2[f];
+  const int cL = in.code[L], cR = in.code[R];
+  if (cL != kWet && cR != kWet) {  // dry-dry (or flooded) faces carry nothing
+    ZeroFace(s, f);
+    face_flux[f] = face_flux_len[f] = 0.0;
+    return;
+  }
+  const double nx = in.nx[f], ny = in.ny[f], len = in.len[f];
+  const double hL = in.h[L], hR = in.h[R];
+  const double df = in.face_d[f];
+
+  bool riemann;
+  if (cL == kWet && cR == kWet) {
+    riemann = true;
+  } else if (cL == kWet && cR == kFlooded) {
+    riemann = in.second || in.eta[L] + in.d[R] > 0;
+  } else if (cL == kFlooded && cR == kWet) {
+    riemann = in.second || in.d[L] + in.eta[R] > 0;
+  } else {
+    riemann = false;  // wet against dry: land treatment of the wet side
+  }
+
+  const bool first = !in.second ||
+                     (in.face_limit_dry && (0.05 * (in.h_min + hL + hR) > hL || 0.05 * (in.h_min + hL + hR) > hR));
+  SideValues l{in.eta[L], in.P[L], in.Q[L], in.d[L], hL};
+  SideValues r{in.eta[R], in.P[R], in.Q[R], in.d[R], hR};
+  if (!first) {
+    const double ax = in.rx1[f], ay = in.ry1[f], bx = in.rx2[f], by = in.ry2[f];
+    l.eta += in.eta_x[L] * ax + in.eta_y[L] * ay;
+    l.P += in.P_x[L] * ax + in.P_y[L] * ay;
+    l.Q += in.Q_x[L] * ax + in.Q_y[L] * ay;
+    r.eta += in.eta_x[R] * bx + in.eta_y[R] * by;
+    r.P += in.P_x[R] * bx + in.P_y[R] * by;
+    r.Q += in.Q_x[R] * bx + in.Q_y[R] * by;
+    if (in.face_value_limiter > 0) {
+      const double e0 = in.eta[L], e1 = in.eta[R];
+      const double p0 = in.P[L], p1 = in.P[R], q0 = in.Q[L], q1 = in.Q[R];
+      l.eta = Clip(l.eta, e0, e1), r.eta = Clip(r.eta, e0, e1);
+      l.P = Clip(l.P, p0, p1), r.P = Clip(r.P, p0, p1);
+      l.Q = Clip(l.Q, q0, q1), r.Q = Clip(r.Q, q0, q1);
+    }
+    if (in.preserve_dU) {
+      // Keep the sign of the jump of the centre values at the face.
+      auto keep = [](double& a, double& b, double ca, double cb) {
+        if ((b - a) * (cb - ca) < 0) a = b = 0.5 * (a + b);
+      };
+      keep(l.eta, r.eta, in.eta[L], in.eta[R]);
+      keep(l.P, r.P, in.P[L], in.P[R]);
+      keep(l.Q, r.Q, in.Q[L], in.Q[R]);
+    }
+  }
+  // Face d and face depths from d_f, except with face_average_d 0 and at the
+  // faces of a second-order run that fell back to first order, where each
+  // side keeps its centre d and h.
+  if (in.fad != 0 && (!first || !in.second)) {
+    FaceDepth(l, df);
+    FaceDepth(r, df);
+  }
+  const double kL = in.k[L], kR = in.k[R];
+  const double g = in.g;
+  // Bed-slope factors g X d_f len of the two sides (X = eta + k at the centre).
+  const double bL = g * (in.eta[L] + kL) * df * len;
+  const double bR = g * (in.eta[R] + kR) * df * len;
+
+  double Dx = 0.0, Dy = 0.0;
+  if (riemann) {
+    RiemannSide sl, sr;
+    sl.wet = cL == kWet ? 1 : 0;
+    sl.h = l.h, sl.d = l.d, sl.hp = l.h + kL, sl.P = l.P, sl.Q = l.Q;
+    if (cL == kWet && l.h >= in.h_min && l.h > 0) sl.u = l.P / l.h, sl.v = l.Q / l.h;
+    sr.wet = cR == kWet ? 1 : 0;
+    sr.h = r.h, sr.d = r.d, sr.hp = r.h + kR, sr.P = r.P, sr.Q = r.Q;
+    if (cR == kWet && r.h >= in.h_min && r.h > 0) sr.u = r.P / r.h, sr.v = r.Q / r.h;
+    const RiemannFlux F = RiemannFaceFlux(sl, sr, nx, ny, in.h_min, in.solver, in.entropy_fix, len, g);
+    if (in.eddy) {
+      EddyFlux(0.5 * (in.nu[L] + in.nu[R]), 0.5 * (hL + hR), 0.5 * (in.ux[L] + in.ux[R]),
+               0.5 * (in.uy[L] + in.uy[R]), 0.5 * (in.vx[L] + in.vx[R]), 0.5 * (in.vy[L] + in.vy[R]), nx, ny,
+               len, Dx, Dy);
+    }
+    const double fx = F.momx - Dx, fy = F.momy - Dy;
+    s.f_mass[f] = F.mass;
+    face_flux[f] = F.Fh;
+    face_flux_len[f] = F.mass;
+    if (cL == kWet) {
+      s.f_mx1[f] = -fx + bL * nx;
+      s.f_my1[f] = -fy + bL * ny;
+    } else {
+      s.f_mx1[f] = s.f_my1[f] = 0.0;
+    }
+    if (cR == kWet) {
+      s.f_mx2[f] = fx - bR * nx;
+      s.f_my2[f] = fy - bR * ny;
+    } else {
+      s.f_mx2[f] = s.f_my2[f] = 0.0;
+    }
+    return;
+  }
+
+  // Land treatment of the wet side: no mass flux, the wall pressure and the
+  // bed-slope term.
+  s.f_mass[f] = 0.0;
+  face_flux[f] = face_flux_len[f] = 0.0;
+  if (cL == kWet) {
+    const double hs = l.h;
+    const double un = (hs >= in.h_min && hs > 0) ? (l.P * nx + l.Q * ny) / hs : 0.0;
+    const double hw = WallDepth(in.land_condition, un, hs, kL, g);
+    const double pw = 0.5 * g * (hw * hw - l.d * l.d) * len;
+    if (in.eddy) EddyFlux(in.nu[L], hs, in.ux[L], in.uy[L], in.vx[L], in.vy[L], nx, ny, len, Dx, Dy);
+    s.f_mx1[f] = -(pw * nx - Dx) + bL * nx;
+    s.f_my1[f] = -(pw * ny - Dy) + bL * ny;
+    s.f_mx2[f] = s.f_my2[f] = 0.0;
+  } else {
+    const double hs = r.h;
+    const double un = (hs >= in.h_min && hs > 0) ? -(r.P * nx + r.Q * ny) / hs : 0.0;
+    const double hw = WallDepth(in.land_condition, un, hs, kR, g);
+    const double pw = 0.5 * g * (hw * hw - r.d * r.d) * len;
+    if (in.eddy) EddyFlux(in.nu[R], hs, in.ux[R], in.uy[R], in.vx[R], in.vy[R], nx, ny, len, Dx, Dy);
+    s.f_mx2[f] = (pw * nx - Dx) - bR * nx;
+    s.f_my2[f] = (pw * ny - Dy) - bR * ny;
+    s.f_mx1[f] = s.f_my1[f] = 0.0;
+  }
+}
+
+FaceLoopInput GatherInput(const HdModule& hd, const HdSolver& s, const Mesh& mesh) {
+  const HdState& st = hd.state;
+  const HdSolutionTechnique& sol = hd.solution;
+  FaceLoopInput in;
+  in.e1 = mesh.faces.element1.data();
+  in.e2 = mesh.faces.element2.data();
+  in.nx = mesh.faces.nx.data();
+  in.ny = mesh.faces.ny.data();
+  in.len = mesh.faces.length.data();
+  in.eta = st.eta.data();
+  in.d = st.d.data();
+  in.h = st.h.data();
+  in.P = st.P.data();
+  in.Q = st.Q.data();
+  in.code = st.wetdry.data();
+  in.k = s.depth_correction.data();
+  in.face_d = st.face_d.data();
+  in.second = sol.scheme_of_space_discretization_horizontal == 2;
+  in.rx1 = s.rx1.data();
+  in.ry1 = s.ry1.data();
+  in.rx2 = s.rx2.data();
+  in.ry2 = s.ry2.data();
+  in.eta_x = s.eta_x.data();
+  in.eta_y = s.eta_y.data();
+  in.P_x = s.P_x.data();
+  in.P_y = s.P_y.data();
+  in.Q_x = s.Q_x.data();
+  in.Q_y = s.Q_y.data();
+  in.eddy = hd.eddy.horizontal.type > 0;
+  in.nu = st.nu_t.data();
+  in.ux = st.ux.data();
+  in.uy = st.uy.data();
+  in.vx = st.vx.data();
+  in.vy = st.vy.data();
+  in.h_min = hd.flood_dry.mass_depth;
+  in.g = kPhysical.g;
+  in.solver = sol.type_of_Riemann_solver;
+  in.entropy_fix = sol.type_of_entropy_fix;
+  in.fad = sol.face_average_d;
+  in.land_condition = sol.type_of_land_condition;
+  in.face_value_limiter = sol.face_value_limiter;
+  in.preserve_dU = sol.preserve_dU;
+  in.face_limit_dry = sol.face_limit_dry;
+  return in;
+}
+
+}  // namespace
+
+void SetupSolverHD(HdModule& hd, const Mesh& mesh, HdSolver& s) {
+  if (IsGeographic(mesh.projection)) {
+    FatalError("SetupSolverHD: the 2D shallow-water solver does not support geographic (LONG/LAT) meshes");
+  }
+  const int ne = mesh.elements.nelements;
+  const int ne_owned = mesh.elements.nelements_int > 0 ? mesh.elements.nelements_int : ne;
+  const int nf = mesh.faces.nfaces;
+  const FaceTable& F = mesh.faces;
+  const ElementTable& E = mesh.elements;
+
+  int n_interior = 0, n_boundary = 0;
+  for (int f = 1; f <= nf; ++f) {
+    const int a = F.element1[f], b = F.element2[f];
+    if (b > 0) {
+      if (a <= ne_owned || b <= ne_owned) ++n_interior;
+    } else if (a > 0 && a <= ne_owned) {
+      ++n_boundary;
+    }
+  }
+  s.interior_faces.assign(n_interior);
+  s.boundary_faces.assign(n_boundary);
+  int ki = 0, kb = 0;
+  for (int f = 1; f <= nf; ++f) {
+    const int a = F.element1[f], b = F.element2[f];
+    if (b > 0) {
+      if (a <= ne_owned || b <= ne_owned) s.interior_faces[++ki] = f;
+    } else if (a > 0 && a <= ne_owned) {
+      BoundaryFaceRecord& r = s.boundary_faces[++kb];
+      r.face = f;
+      r.element = a;
+      r.kind = kBoundaryLand;
+    }
+  }
+
+  // Element -> (face, side) in the element's local face order.
+  s.element_face_start.assign(ne + 1);
+  s.element_face_start[1] = 1;
+  for (int e = 1; e <= ne; ++e) s.element_face_start[e + 1] = s.element_face_start[e] + ElementFaceCount(E, e);
+  s.element_face_code.assign(std::max(0, s.element_face_start[ne + 1] - 1));
+  for (int e = 1; e <= ne; ++e) {
+    for (int j = 1; j <= ElementFaceCount(E, e); ++j) {
+      const int f = ElementFace(E, e, j);
+      s.element_face_code[s.element_face_start[e] + j - 1] = 2 * f + (F.element1[f] == e ? 0 : 1);
+    }
+  }
+
+  // Face still water depth and centroid-to-face offsets.
+  const int fad = hd.solution.face_average_d;
+  HdState& st = hd.state;
+  st.face_d.assign(nf);
+  s.rx1.assign(nf);
+  s.ry1.assign(nf);
+  s.rx2.assign(nf);
+  s.ry2.assign(nf);
+  for (int f = 1; f <= nf; ++f) {
+    const int a = F.element1[f], b = F.element2[f];
+    if (fad == 2) {
+      double zsum = 0.0;
+      const int nn = FaceNodeCount(F, f);
+      for (int j = 1; j <= nn; ++j) zsum += mesh.nodes.z[FaceNode(F, f, j)];
+      st.face_d[f] = -zsum / nn;
+    } else {
+      st.face_d[f] = b > 0 ? 0.5 * (st.d[a] + st.d[b]) : st.d[a];
+    }
+    s.rx1[f] = F.xf[f] - E.xc[a];
+    s.ry1[f] = F.yf[f] - E.yc[a];
+    if (b > 0) {
+      s.rx2[f] = F.xf[f] - E.xc[b];
+      s.ry2[f] = F.yf[f] - E.yc[b];
+    }
+  }
+
+  s.f_mass.assign(nf);
+  s.f_mx1.assign(nf);
+  s.f_my1.assign(nf);
+  s.f_mx2.assign(nf);
+  s.f_my2.assign(nf);
+  for (Array1<double>* a : {&s.eta_x, &s.eta_y, &s.P_x, &s.P_y, &s.Q_x, &s.Q_y, &s.src_h, &s.src_P, &s.src_Q,
+                            &s.depth_correction, &s.filter_u, &s.filter_v}) {
+    a->assign(ne, 0.0);
+  }
+  s.filter_weight.assign(ne);
+  for (int e = 1; e <= ne; ++e) s.filter_weight[e] = E.area[e];
+  s.shallow_depth_option = hd.flood_dry.type;
+  if (hd.solution.scheme_of_space_discretization_horizontal == 2 && hd.solution.gradient_limiter != 0 &&
+      hd.solution.gradient_limiter != 3) {
+    FatalError("SetupSolverHD: gradient_limiter " + std::to_string(hd.solution.gradient_limiter) +
+               " of SOLUTION_TECHNIQUE is not available in the 2D solver (use 0 none or 3 Barth-Jespersen)");
+  }
+}
+
+void BoundaryFaceTerms(const HdModule& hd, HdSolver& s, const Mesh& mesh, const BoundaryFaceRecord& rec) {
+  const HdState& st = hd.state;
+  const HdSolutionTechnique& sol = hd.solution;
+  const int f = rec.face, c = rec.element;
+  const double g = kPhysical.g;
+  const double nx = mesh.faces.nx[f], ny = mesh.faces.ny[f], len = mesh.faces.length[f];
+  const double df = st.face_d[f];
+  const double k = s.depth_correction[c];
+  // Face values of the inner element: first order at closed walls.
+  SideValues side{st.eta[c], st.P[c], st.Q[c], st.d[c], st.h[c]};
+  if (sol.face_average_d != 0) FaceDepth(side, df);
+  const double hs = side.h, ds = side.d;
+  const double h_min = hd.flood_dry.mass_depth;
+  switch (rec.kind) {
+    case kBoundaryLand:
+    default: {
+      const double un = (hs >= h_min && hs > 0) ? (st.P[c] * nx + st.Q[c] * ny) / hs : 0.0;
+      const double hw = WallDepth(sol.type_of_land_condition, un, hs, k, g);
+      const double pw = 0.5 * g * (hw * hw - ds * ds) * len;
+      double Dx = 0.0, Dy = 0.0;
+      if (hd.eddy.horizontal.type > 0) {
+        EddyFlux(st.nu_t[c], hs, st.ux[c], st.uy[c], st.vx[c], st.vy[c], nx, ny, len, Dx, Dy);
+      }
+      const double b = g * (st.eta[c] + k) * df * len;
+      s.f_mass[f] = 0.0;
+      s.f_mx1[f] = -(pw * nx - Dx) + b * nx;
+      s.f_my1[f] = -(pw * ny - Dy) + b * ny;
+      break;
+    }
+  }
+}
+
+void CalcDerivativesOnlySW2D(HdModule& hd, HdSolver& s, const Mesh& mesh) {
+  HdState& st = hd.state;
+  const FaceLoopInput in = GatherInput(hd, s, mesh);
+  double* face_flux = st.face_flux.data();
+  double* face_flux_len = st.face_flux_len.data();
+
+  const int ni = s.interior_faces.size();
+  const int* faces = s.interior_faces.data();
+  VHD_OMP_PARALLEL_FOR
+  for (int i = 1; i <= ni; ++i) InteriorFace(in, s, face_flux, face_flux_len, faces[i]);
+
+  const int nb = s.boundary_faces.size();
+  VHD_OMP_PARALLEL_FOR
+  for (int i = 1; i <= nb; ++i) {
+    const BoundaryFaceRecord& rec = s.boundary_faces[i];
+    st.face_flux[rec.face] = st.face_flux_len[rec.face] = 0.0;
+    if (st.wetdry[rec.element] == kWet) {
+      BoundaryFaceTerms(hd, s, mesh, rec);
+    } else {
+      ZeroFace(s, rec.face);
+    }
+  }
+
+  // Element sums in local face order, divided by the area.
+  const int ne = mesh.elements.nelements_int > 0 ? mesh.elements.nelements_int : mesh.elements.nelements;
+  const int* start = s.element_face_start.data();
+  const int* codes = s.element_face_code.data();
+  const double* area = mesh.elements.area.data();
+  VHD_OMP_PARALLEL_FOR
+  for (int e = 1; e <= ne; ++e) {
+    double sh = 0.0, sP = 0.0, sQ = 0.0;
+    for (int k = start[e]; k < start[e + 1]; ++k) {
+      const int f = codes[k] >> 1;
+      if (codes[k] & 1) {
+        sh += s.f_mass[f];
+        sP += s.f_mx2[f];
+        sQ += s.f_my2[f];
+      } else {
+        sh -= s.f_mass[f];
+        sP += s.f_mx1[f];
+        sQ += s.f_my1[f];
+      }
+    }
+    const double inv = 1.0 / area[e];
+    st.dhdt[e] = sh * inv;
+    st.dPdt[e] = sP * inv;
+    st.dQdt[e] = sQ * inv;
+  }
+}
+
+void CALCDERIVATIVESW2D(HdModule& hd, HdSolver& s, const Mesh& mesh, int /*stage*/, double dt,
+                        bool last_stage) {
+  CalcDerivativesOnlySW2D(hd, s, mesh);
+
+  // Element update of the stage from the base state of the step.
+  HdState& st = hd.state;
+  const int ne = mesh.elements.nelements_int > 0 ? mesh.elements.nelements_int : mesh.elements.nelements;
+  const double h_min = hd.flood_dry.mass_depth;
+  const int damping = s.shallow_depth_option;
+  const bool iterate_drag = hd.solution.bed_resistance_discretization == 2;
+  constexpr double half_pi = 0.5 * std::numbers::pi;
+  VHD_OMP_PARALLEL_FOR
+  for (int e = 1; e <= ne; ++e) {
+    double hn = st.h_old[e] + dt * (st.dhdt[e] + s.src_h[e]);
+    double Pn, Qn;
+    if (st.wetdry[e] == kWet) {
+      double damp = 1.0;
+      if (damping == 1 && hn < 2.0 * h_min) damp = hn > h_min ? std::sin((hn - h_min) * half_pi / h_min) : 0.0;
+      const double dts = dt * damp;
+      const double Ps = st.P_old[e] + dts * (st.dPdt[e] + s.src_P[e]);
+      const double Qs = st.Q_old[e] + dts * (st.dQdt[e] + s.src_Q[e]);
+      const double cf = st.cf[e] + st.cf_surface[e];
+      double rdrag = 0.0;
+      if (hn > h_min && hn > 0) {
+        const double u = st.P[e] / hn, v = st.Q[e] / hn;
+        rdrag = cf * std::sqrt(u * u + v * v) / hn;
+      }
+      Pn = Ps / (1.0 + dts * rdrag);
+      Qn = Qs / (1.0 + dts * rdrag);
+      if (iterate_drag && hn > h_min && hn > 0) {
+        const double u = Pn / hn, v = Qn / hn;
+        rdrag = cf * std::sqrt(u * u + v * v) / hn;
+        Pn = Ps / (1.0 + dts * rdrag);
+        Qn = Qs / (1.0 + dts * rdrag);
+      }
+    } else {
+      Pn = st.P_old[e] + dt * st.dPdt[e];
+      Qn = st.Q_old[e] + dt * st.dQdt[e];
+    }
+    if (!last_stage) hn = std::max(0.0, hn);
+    st.h[e] = hn;
+    st.eta[e] = hn - st.d[e];
+    st.P[e] = Pn;
+    st.Q[e] = Qn;
+  }
+}
+
+void CALCVELOCITYFILTER2D(HdModule& hd, HdSolver& s, const Mesh& mesh) {
+  HdState& st = hd.state;
+  const int ne = mesh.elements.nelements_int > 0 ? mesh.elements.nelements_int : mesh.elements.nelements;
+  const double h_min = hd.flood_dry.mass_depth;
+  const double c = hd.solution.filtering_coefficient;
+  const FaceTable& F = mesh.faces;
+  auto qualifies = [&](int e) { return st.wetdry[e] == kWet && st.h[e] >= h_min && st.h[e] > 0; };
+  VHD_OMP_PARALLEL_FOR
+  for (int e = 1; e <= ne; ++e) {
+    s.filter_u[e] = st.h[e] > 0 ? st.P[e] / st.h[e] : 0.0;
+    s.filter_v[e] = st.h[e] > 0 ? st.Q[e] / st.h[e] : 0.0;
+    if (!(st.wetdry[e] == kWet && st.h[e] > h_min)) continue;
+    double w = s.filter_weight[e];
+    double su = w * s.filter_u[e], sv = w * s.filter_v[e];
+    for (int k = s.element_face_start[e]; k < s.element_face_start[e + 1]; ++k) {
+      const int f = s.element_face_code[k] >> 1;
+      const int nb = (s.element_face_code[k] & 1) ? F.element1[f] : F.element2[f];
+      if (nb <= 0 || !qualifies(nb)) continue;
+      const double wn = s.filter_weight[nb];
+      w += wn;
+      su += wn * st.P[nb] / st.h[nb];
+      sv += wn * st.Q[nb] / st.h[nb];
+    }
+    s.filter_u[e] = (1.0 - c) * s.filter_u[e] + c * su / w;
+    s.filter_v[e] = (1.0 - c) * s.filter_v[e] + c * sv / w;
+  }
+  VHD_OMP_PARALLEL_FOR
+  for (int e = 1; e <= ne; ++e) {
+    if (st.wetdry[e] == kWet && st.h[e] > h_min) {
+      st.P[e] = s.filter_u[e] * st.h[e];
+      st.Q[e] = s.filter_v[e] * st.h[e];
+    }
+  }
+}
+
+}  // namespace vhd

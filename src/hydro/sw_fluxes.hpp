@@ -1,0 +1,121 @@
+#pragma once
+// Shallow-water derivatives of the 2D finite-volume scheme.
+//
+// CALCDERIVATIVESW2D evaluates, for one stage of the HD time integration, the
+// time derivatives of the conserved quantities of every owned element,
+//     dh/dt = -1/A sum_faces F_h len
+//     dP/dt = -1/A sum_faces (F_P - D_P) len + g eta grad(d) + sources
+//     dQ/dt = -1/A sum_faces (F_Q - D_Q) len + g eta grad(d) + sources
+// with F the numerical flux of RiemannFaceFlux (pre-balanced pressure
+// g/2 (h^2 - d^2)), g eta grad(d) the bed-slope term formed face by face from
+// the face still water depth, and D the diffusive momentum flux of the eddy
+// viscosity; then advances the element state over the stage (element update
+// with semi-implicit bed drag, see time_step.hpp).
+//
+// Inputs: HdState (eta, d, h, P, Q, wet/dry codes, cf, nu_t, velocity
+// gradients), the mesh geometry, the settings of HdSolutionTechnique and
+// h_min = mass_depth of HdFloodDry. Outputs: dhdt (m/s), dPdt, dQdt (m2/s2),
+// the face mass fluxes face_flux (m2/s) and face_flux_len (m3/s) of HdState
+// (positive from element1 to element2) and the new h, eta, P, Q.
+//
+// Threads. The face loop writes each face's contributions into face arrays
+// (one slot per side); the element loop then sums them per element over the
+// element's faces in its local face order. No two threads ever add to one
+// element, and the order of additions is fixed, so results are the same to
+// the last bit for any thread count.
+//
+// Settings interpreted here where the product leaves them open:
+//   - face_value_limiter > 0 clips each reconstructed face value of eta, P, Q
+//     to the range of the two element-centre values across the face;
+//   - the element depth correction k is zero (no depth correction is active);
+//   - the bed-slope term is g X d_f n len for both components (the extra
+//     g X^2/2 n_y len of the y form sums to zero over a closed element);
+//   - CALCVELOCITYFILTER2D blends: u_new = (1 - c) u + c u_mean with
+//     c = filtering_coefficient and u_mean the area-weighted mean of the
+//     element and its qualifying face neighbours.
+
+#include "core/array1.hpp"
+#include "hydro/hd_module.hpp"
+#include "hydro/riemann.hpp"
+#include "mesh/mesh.hpp"
+
+namespace vhd {
+
+// Kinds of prepared boundary-face records. Open boundary types add their kinds
+// and fill the record's values before the face loop; the face loop calls
+// BoundaryFaceTerms, which forms the outer state from the record.
+inline constexpr int kBoundaryLand = 0;
+
+struct BoundaryFaceRecord {
+  int face = 0;     // mesh face
+  int element = 0;  // inner element (element1 of the face)
+  int kind = kBoundaryLand;
+  double values[8] = {0, 0, 0, 0, 0, 0, 0, 0};  // prepared outer values of the kind
+};
+
+// The solver's own setup-time tables and work arrays (allocated once).
+struct HdSolver {
+  // Interior faces handled by this process (element2 > 0 and at least one
+  // owned side), and the prepared boundary faces.
+  Array1<int> interior_faces;
+  Array1<BoundaryFaceRecord> boundary_faces;
+
+  // Per element: its faces in local order, encoded 2 * face + side (side 0:
+  // the element is element1, 1: element2), compressed rows.
+  Array1<int> element_face_start, element_face_code;
+
+  // Per face: offsets from the centroids of element1 and element2 to the face
+  // centre (m). (The face still water depth d_f of the bed-slope term is
+  // HdState::face_d, set here at setup.)
+  Array1<double> rx1, ry1, rx2, ry2;
+
+  // Per face contributions of the current stage, one slot per side, already
+  // signed for that side: mass (m3/s) and momentum (m4/s2).
+  Array1<double> f_mass, f_mx1, f_my1, f_mx2, f_my2;
+
+  // Per element: limited gradients of eta, P, Q (second order).
+  Array1<double> eta_x, eta_y, P_x, P_y, Q_x, Q_y;
+  // Element source terms of the stage, filled by forcings and sources: depth
+  // (m/s) for every element, momentum (m2/s2) for wet elements.
+  Array1<double> src_h, src_P, src_Q;
+  // Element depth correction k (m), zero in ordinary runs.
+  Array1<double> depth_correction;
+  // Weight of the velocity filter (element area, m2), and scratch for it.
+  Array1<double> filter_weight, filter_u, filter_v;
+
+  // Shallow-water damping option of the element update: 0 none; 1 momentum
+  // update damped by sin((h - h_min) pi/2 / h_min) below 2 h_min; > 0 scales
+  // the wind-type forcings by h^2 / (4 h_min^2) below 2 h_min. Set from the
+  // flood-and-dry type at setup.
+  int shallow_depth_option = 0;
+  // 1 when the gravity-wave term is not part of the explicit step (CFL rate
+  // without 2 sqrt(g h)); 0 for the explicit shallow-water equations.
+  int implicit_gravity = 0;
+  // Threshold of the Barth-Jespersen limiter (same unit as the variable).
+  double limiter_epsilon = 1e-12;
+};
+
+// Builds the solver tables for the velocity mesh of the module; allocates
+// every work array. Called once after SetupHD.
+void SetupSolverHD(HdModule& hd, const Mesh& mesh, HdSolver& solver);
+
+// Derivatives of one stage and the element update: base state h_old, P_old,
+// Q_old; stage step dt_stage (s); last_stage is true for the final stage of
+// the step (the depth is cut at 0 after every other stage).
+void CALCDERIVATIVESW2D(HdModule& hd, HdSolver& solver, const Mesh& mesh, int stage, double dt_stage,
+                        bool last_stage);
+
+// Face and element sums only (no update): fills dhdt, dPdt, dQdt of the
+// current state. Used by CALCDERIVATIVESW2D and by tests of balance.
+void CalcDerivativesOnlySW2D(HdModule& hd, HdSolver& solver, const Mesh& mesh);
+
+// Velocity filter after a stage (second order, type_of_filtering >= 1).
+void CALCVELOCITYFILTER2D(HdModule& hd, HdSolver& solver, const Mesh& mesh);
+
+// Contributions of one boundary face from its prepared record: fills the
+// face slots of side 1 (element1) in solver.f_* . The inner element must be
+// wet; land faces get the wall pressure and the bed-slope term.
+void BoundaryFaceTerms(const HdModule& hd, HdSolver& solver, const Mesh& mesh,
+                       const BoundaryFaceRecord& record);
+
+}  // namespace vhd

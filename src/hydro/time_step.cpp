@@ -1,0 +1,189 @@
+#include "hydro/time_step.hpp"
+
+#include <algorithm>
+#include <cmath>
+
+#include "core/omp.hpp"
+#include "hydro/reconstruction.hpp"
+#include "log/log.hpp"
+
+namespace vhd {
+
+namespace {
+
+constexpr double kRadToDeg = 57.29577951308232;
+
+void CopyBaseState(HdState& st) {
+  const int ne = st.nelements_owned;
+  VHD_OMP_PARALLEL_FOR
+  for (int e = 1; e <= ne; ++e) {
+    st.h_old[e] = st.h[e];
+    st.P_old[e] = st.P[e];
+    st.Q_old[e] = st.Q[e];
+  }
+}
+
+}  // namespace
+
+double CalcCflRatesHD(HdModule& hd, const HdSolver& solver, const Mesh& mesh) {
+  HdState& st = hd.state;
+  const int ne = st.nelements_owned;
+  const double g = kPhysical.g;
+  const bool gravity = solver.implicit_gravity == 0;
+  (void)mesh;
+  double rmax = 0.0;
+  VHD_OMP_PARALLEL_FOR_REDUCTION(max, rmax)
+  for (int e = 1; e <= ne; ++e) {
+    const double h = st.eta[e] + st.d[e];
+    double r = -1.0;
+    if (st.wetdry[e] == kWet && h > 0) {
+      const double u = st.u[e], v = st.v[e];
+      r = (std::abs(u) + std::abs(v) + (gravity ? 2.0 * std::sqrt(g * h) : 0.0)) / st.length[e];
+      rmax = std::max(rmax, r);
+    }
+    st.cfl_rate[e] = r;
+  }
+  return rmax;
+}
+
+double SplitTimeStepHD(double dt, double remainder) {
+  const double reduced = remainder - 1e-6 * remainder;
+  if (dt > reduced) return remainder;
+  return remainder / (std::floor(reduced / dt) + 1.0);
+}
+
+double CALCTIMESTEPHD(HdModule& hd, const HdSolver& solver, const Mesh& mesh, double t, double t_end) {
+  const HdTimeStepControl& c = hd.time_step;
+  const double rmax = CalcCflRatesHD(hd, solver, mesh);
+  double dt;
+  if (c.CFL_critical_HD / c.dt_max_HD > rmax) {
+    dt = c.dt_max_HD;
+  } else {
+    dt = std::max(c.dt_min_HD, c.CFL_critical_HD / rmax);
+  }
+  return SplitTimeStepHD(dt, t_end - t);
+}
+
+void CHECKTIMESTEPHD(HdModule& hd, const Mesh& mesh, double dt) {
+  HdState& st = hd.state;
+  const int ne = st.nelements_owned;
+  const double g = kPhysical.g;
+  (void)mesh;
+  VHD_OMP_PARALLEL_FOR
+  for (int e = 1; e <= ne; ++e) {
+    const double h = st.h[e];
+    if (st.wetdry[e] != kWet || h <= 0) continue;
+    const double u = st.P[e] / h, v = st.Q[e] / h;
+    const double c = std::sqrt(g * h);
+    const double s = std::abs(u) + std::abs(v);
+    const double L = st.length[e];
+    if ((s + 2.0 * c) * dt / L > 1.0) {
+      const double a = L / (2.0 * dt) - 2.0 * c;
+      if (s > 1e-6 && a > 0) {
+        st.P[e] *= a / s;
+        st.Q[e] *= a / s;
+      } else {
+        st.P[e] = st.Q[e] = 0.0;
+      }
+    }
+  }
+}
+
+void ReportCflViolations(std::string_view title, const Mesh& mesh, const Array1<double>& cfl,
+                         const Array1<int>& code, const Array1<double>* still_depth, double t, double dt,
+                         long long& count, int maximum, int error_level) {
+  const int ne = mesh.elements.nelements_int > 0 ? mesh.elements.nelements_int : mesh.elements.nelements;
+  const bool geographic = IsGeographic(mesh.projection);
+  const double scale = geographic ? kRadToDeg : 1.0;
+  bool violated = false;
+  for (int e = 1; e <= ne; ++e) {
+    if (code[e] != kWet || !(cfl[e] > 1.00001)) continue;
+    violated = true;
+    ++count;
+    if (count <= maximum) {
+      Warning(title);
+      WriteValueLine("time                  : %", t);
+      WriteValueLine("time step interval    : %", dt);
+      WriteValueLine("element number        : %", e);
+      WriteValueLine("CFL number            : %", cfl[e]);
+      WriteValueLine("x-coordinate (center) : %", mesh.elements.xc[e] * scale);
+      WriteValueLine("y-coordinate (center) : %", mesh.elements.yc[e] * scale);
+      if (still_depth) WriteValueLine("still water depth     : %", (*still_depth)[e]);
+      WriteValueLine("length                : %", mesh.elements.length[e]);
+    }
+    if (count == maximum) Warning("Number of CFL condition violations is larger than 200");
+  }
+  if ((error_level == 1 && count > maximum) || (error_level == 2 && violated)) {
+    FatalError("Simulation stopped due to CFL violation");
+  }
+}
+
+void InitialStepHD(HdModule& hd, HdSolver& solver, const Mesh& mesh) {
+  HdState& st = hd.state;
+  CALCVELOCITYFROMFLUX(st);
+  for (int f = 1; f <= st.face_flux.size(); ++f) st.face_flux[f] = st.face_flux_len[f] = 0.0;
+  if (hd.solution.scheme_of_space_discretization_horizontal == 2 || hd.eddy.horizontal.type > 0) {
+    UpdateGradientsHD(hd, solver, mesh);
+  }
+  CalcDerivativesOnlySW2D(hd, solver, mesh);
+}
+
+void StepHD(HdModule& hd, HdSolver& solver, const Mesh& mesh, double t, double dt, int& run_status) {
+  HdState& st = hd.state;
+  TimingSet& timing = hd.timing;
+  const bool timed = !timing.timers.empty();
+  auto start = [&](int k) { if (timed) StartTiming(timing, k); };
+  auto stop = [&](int k) { if (timed) StopTiming(timing, k); };
+  start(kHdTimerTotal);
+
+  RecordTimeStepHD(hd, dt);
+  const int ne = st.nelements_owned;
+  VHD_OMP_PARALLEL_FOR
+  for (int e = 1; e <= ne; ++e) st.cfl[e] = st.cfl_rate[e] >= 0 ? st.cfl_rate[e] * dt : kCflFloor;
+  ReportCflViolations("CFL condition violated in HD calculation", mesh, st.cfl, st.wetdry, &st.d, t, dt,
+                      hd.n_cfl_violations, hd.time_step.maximum_number_of_errors, hd.time_step.error_level);
+  const double t_new = t + dt;
+
+  start(kHdTimerProperties);
+  CALCRESISTANCEBED(hd, mesh, t_new);
+  if (hd.eddy.horizontal.type > 0) {
+    UpdateGradientsHD(hd, solver, mesh);
+    CALCEDDYVISCOSITYHD(hd, mesh);
+  }
+  stop(kHdTimerProperties);
+
+  CopyBaseState(st);
+  const bool two_stage = hd.solution.scheme_of_time_integration == 2;
+  const bool second = hd.solution.scheme_of_space_discretization_horizontal == 2;
+  const int nstages = two_stage ? 2 : 1;
+  for (int stage = 1; stage <= nstages; ++stage) {
+    const double factor = (two_stage && stage == 1) ? 0.5 : 1.0;
+    start(kHdTimerDerivatives);
+    if (second) UpdateReconstructionHD(hd, solver, mesh);
+    CALCDERIVATIVESW2D(hd, solver, mesh, stage, factor * dt, stage == nstages);
+    stop(kHdTimerDerivatives);
+    if (second && hd.solution.type_of_filtering >= 1) CALCVELOCITYFILTER2D(hd, solver, mesh);
+  }
+
+  start(kHdTimerFloodDry);
+  if (hd.time_step.CFL_correction_HD == 1) CHECKTIMESTEPHD(hd, mesh, dt);
+  CHECKFLOODDRYHD(hd, mesh);
+  CALCVELOCITYFROMFLUX(st);
+  CALCBEDSHEARSTRESS(hd);
+  int status = 0;
+  if (!CheckBlowUpHD(hd, mesh, t_new, &status)) run_status = -1;
+  stop(kHdTimerFloodDry);
+  stop(kHdTimerTotal);
+}
+
+void AdvanceHD(HdModule& hd, HdSolver& solver, const Mesh& mesh, double t0, double t1, int& run_status) {
+  double t = t0;
+  while (std::abs(t1 - t) > 1e-6) {
+    const double dt = CALCTIMESTEPHD(hd, solver, mesh, t, t1);
+    StepHD(hd, solver, mesh, t, dt, run_status);
+    t += dt;
+    if (run_status < 0) return;
+  }
+}
+
+}  // namespace vhd
