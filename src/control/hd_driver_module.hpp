@@ -1,11 +1,13 @@
 #pragma once
 // The hydrodynamic module in the driver's HD slot: owns the module record,
-// the solver tables and the mesh it computes on, and hands the driver's calls
-// to the free functions of the hydrodynamic library.
+// the solver tables and the outputs, knows the mesh it computes on, and hands
+// the driver's calls to the free functions of the hydrodynamic and output
+// libraries.
 
 #include "control/module.hpp"
 #include "hydro/hd_module.hpp"
 #include "hydro/sw_fluxes.hpp"
+#include "output/hd_output.hpp"
 
 namespace vhd {
 
@@ -13,8 +15,12 @@ class HdDriverModule final : public Module {
  public:
   void Setup(const ModuleContext& context) override;
   void InitialStep(double t, int& run_status) override;
+  void OpenOutputs() override;
+  void WriteOutput(int n) override;
   double TimeStep(double t, double t_end) override;
   void Step(const StepTimes& times, int& run_status) override;
+  void CloseOutputs() override;
+  void OutputStatistics() override;
   void PrintStatistics() override;
   void PrintTimings() override;
   double MeshSizeFigure() const override;
@@ -24,7 +30,11 @@ class HdDriverModule final : public Module {
  private:
   HdModule hd_;
   HdSolver solver_;
-  const Mesh* mesh_ = nullptr;  // the velocity mesh of the domain
+  HdOutputs outputs_;
+  const Mesh* mesh_ = nullptr;        // the velocity mesh of the domain
+  const RunControl* run_ = nullptr;
+  double dt_overall_ = 0.0;
+  double t_state_ = 0.0;              // time of the current state (s since the start)
 };
 
 }  // namespace vhd

@@ -9,7 +9,14 @@
 // spacing away. The file's origin and orientation place the grid axes in the
 // projection (easting = x0 + x cos(o) + y sin(o), northing = y0 - x sin(o) +
 // y cos(o)).
+//
+// Line grids give 2-node lines between neighbouring points with data; the ends
+// of every stretch get the land code. 3D grids give hexahedra or prisms whose
+// first face is the lower one, anticlockwise seen from above, whichever way
+// the file's axes run; the corners on the side walls of the water body (where
+// a cell meets land or the edge of the grid in its layer) get the land code.
 
+#include <algorithm>
 #include <cmath>
 #include <new>
 #include <vector>
@@ -247,6 +254,8 @@ void ReadMeshBasicZrn1(Mesh& mesh, const std::string& file_name) {
   }
   const int nx = g.axis.n[0];
   MeshBuilder b(routine, file_name);
+  b.DropUnusedNodes();  // a lone water point between land points is on no line
+  int wet = 0;
   try {
     b.Reserve(nx, nx, 2);
     int previous = 0;  // file id of the previous point with data
@@ -256,6 +265,7 @@ void ReadMeshBasicZrn1(Mesh& mesh, const std::string& file_name) {
         previous = 0;
         continue;
       }
+      ++wet;
       double x = 0, y = 0;
       g.place.Xy2Proj(g.axis.x0[0] + i * g.axis.dx[0], 0.0, x, y);
       b.AddNode(i + 1, x, y, v);
@@ -268,8 +278,8 @@ void ReadMeshBasicZrn1(Mesh& mesh, const std::string& file_name) {
   } catch (const std::bad_alloc&) {
     FatalError(routine + ": Out of memory");
   }
-  if (b.ElementCount() == 0)
-    FatalError("Input bathymetry consists of pure land values. Mesh cannot be generated.");
+  if (wet == 0) FatalError("Input bathymetry consists of pure land values. Mesh cannot be generated.");
+  if (b.ElementCount() == 0) FileError(routine, file_name, "No two neighbouring grid points hold water");
   b.Build(mesh, g.projection);
   // The ends of every stretch of line elements are boundary nodes.
   std::vector<int> uses(static_cast<std::size_t>(mesh.nodes.nnodes) + 1, 0);
@@ -380,33 +390,59 @@ void ReadMeshBasicZrn3(Mesh& mesh, const std::string& file_name, const GridMeshO
     FatalError(routine + ": Wrong mesh file");
   const int nx = g.axis.n[0], ny = g.axis.n[1], nz = g.axis.n[2];
   auto corner = [&](int i, int j, int k) { return (k * (ny + 1) + j) * (nx + 1) + i + 1; };
+  auto cell = [&](int i, int j, int k) { return (static_cast<std::size_t>(k) * ny + j) * nx + i; };
 
   MeshBuilder b(routine, file_name);
   try {
-    std::vector<char> used(static_cast<std::size_t>(nx + 1) * (ny + 1) * (nz + 1), 0);
     std::vector<char> active(static_cast<std::size_t>(nx) * ny * nz, 0);
     for (int k = 0; k < nz; ++k)
       for (int j = 0; j < ny; ++j)
+        for (int i = 0; i < nx; ++i) active[cell(i, j, k)] = HasValue(g, g.values[cell(i, j, k)], true);
+    auto is_active = [&](int i, int j, int k) {
+      return i >= 0 && i < nx && j >= 0 && j < ny && active[cell(i, j, k)];
+    };
+    // Corners in use: 1 inside the water body, 2 on its side walls (land
+    // code), where an active cell meets land or the edge of the grid in its layer.
+    std::vector<char> used(static_cast<std::size_t>(nx + 1) * (ny + 1) * (nz + 1), 0);
+    for (int k = 0; k < nz; ++k)
+      for (int j = 0; j < ny; ++j)
         for (int i = 0; i < nx; ++i) {
-          const std::size_t c = (static_cast<std::size_t>(k) * ny + j) * nx + i;
-          if (!HasValue(g, g.values[c], true)) continue;
-          active[c] = 1;
-          for (int m = 0; m < 8; ++m) used[corner(i + m % 2, j + (m / 2) % 2, k + m / 4) - 1] = 1;
+          if (!active[cell(i, j, k)]) continue;
+          for (int m = 0; m < 8; ++m) {
+            char& u = used[corner(i + m % 2, j + (m / 2) % 2, k + m / 4) - 1];
+            u = std::max<char>(u, 1);
+          }
+          // A side wall facing land or the edge of the grid: its two corners in
+          // both levels of the layer.
+          auto wall = [&](int ia, int ja, int ib, int jb) {
+            for (int kk = k; kk <= k + 1; ++kk) used[corner(ia, ja, kk) - 1] = used[corner(ib, jb, kk) - 1] = 2;
+          };
+          if (!is_active(i - 1, j, k)) wall(i, j, i, j + 1);
+          if (!is_active(i + 1, j, k)) wall(i + 1, j, i + 1, j + 1);
+          if (!is_active(i, j - 1, k)) wall(i, j, i + 1, j);
+          if (!is_active(i, j + 1, k)) wall(i, j + 1, i + 1, j + 1);
         }
     for (int k = 0; k <= nz; ++k)
       for (int j = 0; j <= ny; ++j)
         for (int i = 0; i <= nx; ++i) {
-          if (!used[corner(i, j, k) - 1]) continue;
+          const char u = used[corner(i, j, k) - 1];
+          if (u == 0) continue;
           double x = 0, y = 0;
           g.place.Xy2Proj(g.axis.x0[0] + (i - 0.5) * g.axis.dx[0], g.axis.x0[1] + (j - 0.5) * g.axis.dx[1], x, y);
-          b.AddNode(corner(i, j, k), x, y, g.axis.x0[2] + (k - 0.5) * g.axis.dx[2]);
+          b.AddNode(corner(i, j, k), x, y, g.axis.x0[2] + (k - 0.5) * g.axis.dx[2], u == 2 ? 1 : 0);
         }
+    // Bottom face first, anticlockwise seen from above, then the face above it,
+    // whichever way the file's axes run.
+    const bool flip = g.axis.dx[0] * g.axis.dx[1] < 0;
+    const int below = g.axis.dx[2] > 0 ? 0 : 1;
     for (int k = 0; k < nz; ++k)
       for (int j = 0; j < ny; ++j)
         for (int i = 0; i < nx; ++i) {
-          if (!active[(static_cast<std::size_t>(k) * ny + j) * nx + i]) continue;
-          const int q[4] = {corner(i, j, k), corner(i + 1, j, k), corner(i + 1, j + 1, k), corner(i, j + 1, k)};
-          const int up = (ny + 1) * (nx + 1);
+          if (!active[cell(i, j, k)]) continue;
+          const int kb = k + below, kt = k + 1 - below;
+          int q[4] = {corner(i, j, kb), corner(i + 1, j, kb), corner(i + 1, j + 1, kb), corner(i, j + 1, kb)};
+          if (flip) std::swap(q[1], q[3]);
+          const int up = corner(i, j, kt) - corner(i, j, kb);
           if (type == 33) {
             const int h[8] = {q[0], q[1], q[2], q[3], q[0] + up, q[1] + up, q[2] + up, q[3] + up};
             b.AddElement(33, h, 8);

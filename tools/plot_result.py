@@ -1,0 +1,178 @@
+#!/usr/bin/python3
+"""Plots of VantorHD result files.
+
+  plot_result.py area.zrnu --item "Surface elevation" --step 12 -o eta.png
+  plot_result.py area.zrnu --item "Current speed" --max -o speed_max.png
+  plot_result.py points.zrn0 -o series.png
+  plot_result.py points.zrn0 --item "A: Surface elevation" -o a.png
+
+A .zrnu file gives a map of one element item on the mesh's triangles and
+quadrilaterals, at a step (from 0; negative counts from the end, default the
+last) or as its maximum over all steps. A .zrn0 file gives time series of its
+items (all, or those named with --item), one panel per unit. Items are named
+by their item name (the variable's long_name) or their variable name. Delete
+values are left blank. Writes a PNG.
+"""
+
+import argparse
+import sys
+
+import matplotlib
+
+matplotlib.use("Agg")
+import matplotlib.pyplot as plt  # noqa: E402
+import netCDF4  # noqa: E402
+import numpy as np  # noqa: E402
+from matplotlib.collections import PolyCollection  # noqa: E402
+
+
+def fail(message):
+    print("plot_result.py: " + message, file=sys.stderr)
+    sys.exit(1)
+
+
+def item_variables(nc, spatial_dim=None):
+    """Data variables of the file's items, in item order."""
+    items = []
+    for name, var in nc.variables.items():
+        if "zrn_item" not in var.ncattrs() or var.dimensions[:1] != ("time",):
+            continue
+        if spatial_dim is not None and var.dimensions[1:] != (spatial_dim,):
+            continue
+        items.append((int(var.getncattr("zrn_item")), name))
+    return [name for _, name in sorted(items)]
+
+
+def find_item(nc, wanted, candidates):
+    for name in candidates:
+        var = nc.variables[name]
+        if wanted == name or wanted == getattr(var, "long_name", None):
+            return name
+    titles = ", ".join('"%s"' % getattr(nc.variables[n], "long_name", n) for n in candidates)
+    fail('no item "%s" in %s; items: %s' % (wanted, nc.filepath(), titles))
+
+
+def masked(nc, values):
+    """Values with the file's delete value masked."""
+    values = np.ma.masked_invalid(np.ma.asarray(values, dtype=float))
+    delete = getattr(nc, "zrn_delete_value", None)
+    if delete is not None:
+        values = np.ma.masked_where(np.isclose(values, float(delete), rtol=1e-6, atol=0.0), values)
+    return values
+
+
+def times(nc):
+    t = nc.variables["time"]
+    calendar = getattr(t, "calendar", "standard")
+    if "since" in getattr(t, "units", ""):
+        return netCDF4.num2date(t[:], t.units, calendar, only_use_cftime_datetimes=False,
+                                only_use_python_datetimes=True)
+    return np.asarray(t[:], dtype=float)
+
+
+def label(var):
+    name = getattr(var, "long_name", var.name)
+    units = getattr(var, "units", "")
+    return "%s (%s)" % (name, units) if units else name
+
+
+def plot_map(nc, args):
+    topo = [v for v in nc.variables.values() if getattr(v, "cf_role", "") == "mesh_topology"]
+    if not topo:
+        fail(nc.filepath() + " has no mesh topology")
+    topo = topo[0]
+    xname, yname = topo.node_coordinates.split()
+    x = np.asarray(nc.variables[xname][:], dtype=float)
+    y = np.asarray(nc.variables[yname][:], dtype=float)
+    conn_var = nc.variables[topo.face_node_connectivity]
+    conn = np.ma.filled(conn_var[:], -1).astype(int)
+    start = int(getattr(conn_var, "start_index", 0))
+    face_dim = topo.face_dimension
+    candidates = item_variables(nc, face_dim)
+    if not candidates:
+        fail(nc.filepath() + " has no element items")
+    name = find_item(nc, args.item, candidates) if args.item else candidates[0]
+    var = nc.variables[name]
+    nsteps = var.shape[0]
+    if nsteps == 0:
+        fail(nc.filepath() + " holds no time step")
+    when = times(nc)
+    if args.max:
+        values = masked(nc, var[:]).max(axis=0)
+        title = "Maximum of %s, %s to %s" % (var.long_name, when[0], when[-1])
+    else:
+        step = args.step if args.step is not None else -1
+        if not -nsteps <= step < nsteps:
+            fail("step %d is not in the file (steps 0 to %d)" % (step, nsteps - 1))
+        values = masked(nc, var[step, :])
+        title = "%s at %s" % (var.long_name, when[step])
+
+    polygons = [np.column_stack((x[row[row >= start] - start], y[row[row >= start] - start])) for row in conn]
+    fig, ax = plt.subplots(figsize=(9, 7))
+    collection = PolyCollection(polygons, array=values, cmap=args.cmap, edgecolors="face", linewidths=0.2)
+    if np.ma.count(values) > 0:
+        collection.set_clim(values.min(), values.max())
+    ax.add_collection(collection)
+    ax.autoscale_view()
+    ax.set_aspect("equal")
+    bar = fig.colorbar(collection, ax=ax, shrink=0.8)
+    bar.set_label(label(var))
+    ax.set_title(title)
+    ax.set_xlabel(getattr(nc.variables[xname], "long_name", xname))
+    ax.set_ylabel(getattr(nc.variables[yname], "long_name", yname))
+    return fig
+
+
+def plot_series(nc, args):
+    candidates = [n for n in item_variables(nc) if nc.variables[n].dimensions == ("time",)]
+    if not candidates:
+        fail(nc.filepath() + " has no time series items")
+    names = [find_item(nc, item, candidates) for item in args.item_list] if args.item_list else candidates
+    units = []
+    for name in names:
+        unit = getattr(nc.variables[name], "units", "")
+        if unit not in units:
+            units.append(unit)
+    when = times(nc)
+    fig, axes = plt.subplots(len(units), 1, figsize=(10, 3.5 * len(units)), sharex=True, squeeze=False)
+    for panel, unit in zip(axes[:, 0], units):
+        for name in names:
+            var = nc.variables[name]
+            if getattr(var, "units", "") == unit:
+                panel.plot(when, masked(nc, var[:]), marker="." if len(when) < 50 else None,
+                           label=getattr(var, "long_name", name))
+        panel.set_ylabel(unit)
+        panel.grid(True, alpha=0.3)
+        panel.legend(fontsize="small")
+    axes[0, 0].set_title(getattr(nc, "title", "") or nc.filepath())
+    axes[-1, 0].set_xlabel("time")
+    fig.autofmt_xdate()
+    return fig
+
+
+def main():
+    parser = argparse.ArgumentParser(description=__doc__, formatter_class=argparse.RawDescriptionHelpFormatter)
+    parser.add_argument("file", help="a .zrnu (map) or .zrn0 (time series) result file")
+    parser.add_argument("--item", action="append", dest="item_list",
+                        help="item name or variable name (map: one; series: repeat for several)")
+    parser.add_argument("--step", type=int, help="step of a map, from 0; negative from the end (default: last)")
+    parser.add_argument("--max", action="store_true", help="map the maximum over all steps")
+    parser.add_argument("--cmap", default="viridis", help="matplotlib colour map of a map")
+    parser.add_argument("-o", "--output", help="PNG file (default: the result file's name with .png)")
+    args = parser.parse_args()
+    args.item = args.item_list[0] if args.item_list else None
+    output = args.output or args.file.rsplit(".", 1)[0] + ".png"
+    try:
+        nc = netCDF4.Dataset(args.file)
+    except OSError as error:
+        fail("cannot open %s: %s" % (args.file, error))
+    with nc:
+        is_mesh = any(getattr(v, "cf_role", "") == "mesh_topology" for v in nc.variables.values())
+        fig = plot_map(nc, args) if is_mesh else plot_series(nc, args)
+    fig.tight_layout()
+    fig.savefig(output, dpi=120)
+    print(output)
+
+
+if __name__ == "__main__":
+    main()
