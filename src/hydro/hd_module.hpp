@@ -32,6 +32,7 @@
 
 #include "core/array1.hpp"
 #include "core/run.hpp"
+#include "hydro/bound.hpp"
 #include "io/zrn.hpp"
 #include "log/log.hpp"
 
@@ -314,6 +315,7 @@ struct HdModule {
 
   TimingSet timing;
   HdState state;
+  HdBoundary boundary;  // boundary codes and boundary faces
 };
 
 // ---- entry points ----------------------------------------------------------------

@@ -78,6 +78,7 @@ void SetupHD(HdModule& hd, const RunControl& run, const TimeAxis& time, const Mo
   SetupBedResistanceHD(hd, mesh);
   SetupSolutionMethodHD(hd);
   if (hd.mode == 2) SetupInitialConditionsHD(hd);
+  SetupBoundCondHD(hd, mesh, hd.boundary);
   SetupTimingHD(hd);
   SktCloseSection();
 }

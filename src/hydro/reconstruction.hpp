@@ -1,20 +1,21 @@
 #pragma once
 // Element gradients of the HD state for the second-order reconstruction and
-// the eddy viscosity.
+// the eddy viscosity, on the engine's gradient stencils (mesh/gradient.hpp).
 //
-// Gradients are least-squares fits over the face neighbours of an element
-// that take part (wet or flooded, code > 0): with offsets (dx_i, dy_i) of the
-// neighbour centroids and weights w_i = 1 / (dx_i^2 + dy_i^2),
-//     grad = M^-1 sum w_i (dx_i, dy_i) (phi_i - phi_e),
-//     M = sum w_i (dx_i, dy_i)^T (dx_i, dy_i),
-// exact for linear fields; an element with fewer than two such neighbours, or
-// a singular M, gets a zero gradient. Dry elements are left out so that their
-// surface (the bed above the water) does not tilt the water surface of the
-// wet elements next to them.
+// The stencil is built once at setup (SetupSolverHD) over the permanent mesh
+// layout, with the gradient type `gradient_calculation` and the boundary
+// treatment `boundary_correction` of SOLUTION_TECHNIQUE; drying and flooding
+// never rebuild it. The wet/dry codes enter as the element activity flags of
+// the limiters (1 wet takes part; 0 dry and 2 flooded do not), so that the
+// bed of a dry element above the water neither widens the bounds of a wet
+// element nor limits it.
 //
-// Limiters (gradient_limiter): 0 none; 3 Barth-Jespersen: the gradient is
-// scaled so that the values extrapolated to the face centres stay within the
-// range of the element and its taking-part neighbours.
+// Limiters (`gradient_limiter`): 0 none, 1 ENO, 2 weighted, 3 Barth-Jespersen
+// (threshold HdSolver::limiter_epsilon).
+//
+// Fields: the face reconstruction uses eta, P and Q only (the face still
+// water depth comes from `face_average_d`, not from a reconstructed d), so
+// only those three gradients are formed.
 
 #include "hydro/hd_module.hpp"
 #include "hydro/sw_fluxes.hpp"
@@ -22,11 +23,16 @@
 
 namespace vhd {
 
-// Limited gradients of eta, P and Q into solver.eta_x .. Q_y.
+// Builds the gradient stencil of the solver (and the work arrays of the
+// limiters that need them). Called by SetupSolverHD when second-order space
+// discretisation or eddy viscosity is on.
+void SetupReconstructionHD(const HdModule& hd, const Mesh& mesh, HdSolver& solver);
+
+// Limited gradients of eta, P, Q of the current state into solver.eta_x .. Q_y.
 void UpdateReconstructionHD(HdModule& hd, HdSolver& solver, const Mesh& mesh);
 
-// Velocity gradients state.ux, uy, vx, vy from u = P/h, v = Q/h (wet
-// elements; others 0).
+// Velocity gradients state.ux, uy, vx, vy from the element velocities u, v
+// (0 in elements that are not wet), unlimited.
 void UpdateGradientsHD(HdModule& hd, HdSolver& solver, const Mesh& mesh);
 
 }  // namespace vhd

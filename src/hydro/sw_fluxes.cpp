@@ -6,6 +6,7 @@
 #include <string>
 
 #include "core/omp.hpp"
+#include "hydro/reconstruction.hpp"
 #include "log/log.hpp"
 
 namespace vhd {
@@ -16,17 +17,17 @@ namespace {
 struct FaceLoopInput {
   const int* e1;
   const int* e2;
-  const double *nx, *ny, *len;
+  const double *ex, *ey, *nn, *len;  // unit normal, its length, face length
   const double *eta, *d, *h, *P, *Q;
   const int* code;
   const double* k;
   const double* face_d;
   bool second;
-  const double *rx1, *ry1, *rx2, *ry2;
+  const double *xf, *yf, *xc, *yc;  // face centres and centroids
   const double *eta_x, *eta_y, *P_x, *P_y, *Q_x, *Q_y;
   bool eddy;
   const double *nu, *ux, *uy, *vx, *vy;
-  double h_min, g;
+  double h_min, g, sqrt_g;
   int solver, entropy_fix, fad, land_condition, face_value_limiter;
   bool preserve_dU, face_limit_dry;
 };
@@ -76,7 +77,9 @@ void ZeroFace(HdSolver& s, int f) {
 }
 
 // One interior face: classification, reconstruction, flux and the signed
-// contributions of each side.
+// contributions of each side. Every input of the face is read once; faces
+// without a wet side return before any arithmetic.
+template <bool kSecond>
 inline void InteriorFace(const FaceLoopInput& in, HdSolver& s, double* face_flux, double* face_flux_len,
                          int f) {
   const int L = in.e1[f], R = in.e2[f];
@@ -86,91 +89,104 @@ inline void InteriorFace(const FaceLoopInput& in, HdSolver& s, double* face_flux
     face_flux[f] = face_flux_len[f] = 0.0;
     return;
   }
-  const double nx = in.nx[f], ny = in.ny[f], len = in.len[f];
-  const double hL = in.h[L], hR = in.h[R];
+  const double ex = in.ex[f], ey = in.ey[f], nn = in.nn[f];
+  const double nlen = nn * in.len[f];  // length of the normal times the face length
   const double df = in.face_d[f];
+  SideValues l{in.eta[L], in.P[L], in.Q[L], in.d[L], in.h[L]};
+  SideValues r{in.eta[R], in.P[R], in.Q[R], in.d[R], in.h[R]};
+  const double etaL = l.eta, etaR = r.eta;  // centre values
+  const double hL = l.h, hR = r.h;
 
   bool riemann;
   if (cL == kWet && cR == kWet) {
     riemann = true;
   } else if (cL == kWet && cR == kFlooded) {
-    riemann = in.second || in.eta[L] + in.d[R] > 0;
+    riemann = kSecond || etaL + r.d > 0;
   } else if (cL == kFlooded && cR == kWet) {
-    riemann = in.second || in.d[L] + in.eta[R] > 0;
+    riemann = kSecond || l.d + etaR > 0;
   } else {
     riemann = false;  // wet against dry: land treatment of the wet side
   }
 
-  const bool first = !in.second ||
-                     (in.face_limit_dry && (0.05 * (in.h_min + hL + hR) > hL || 0.05 * (in.h_min + hL + hR) > hR));
-  SideValues l{in.eta[L], in.P[L], in.Q[L], in.d[L], hL};
-  SideValues r{in.eta[R], in.P[R], in.Q[R], in.d[R], hR};
-  if (!first) {
-    const double ax = in.rx1[f], ay = in.ry1[f], bx = in.rx2[f], by = in.ry2[f];
-    l.eta += in.eta_x[L] * ax + in.eta_y[L] * ay;
-    l.P += in.P_x[L] * ax + in.P_y[L] * ay;
-    l.Q += in.Q_x[L] * ax + in.Q_y[L] * ay;
-    r.eta += in.eta_x[R] * bx + in.eta_y[R] * by;
-    r.P += in.P_x[R] * bx + in.P_y[R] * by;
-    r.Q += in.Q_x[R] * bx + in.Q_y[R] * by;
-    if (in.face_value_limiter > 0) {
-      const double e0 = in.eta[L], e1 = in.eta[R];
-      const double p0 = in.P[L], p1 = in.P[R], q0 = in.Q[L], q1 = in.Q[R];
-      l.eta = Clip(l.eta, e0, e1), r.eta = Clip(r.eta, e0, e1);
-      l.P = Clip(l.P, p0, p1), r.P = Clip(r.P, p0, p1);
-      l.Q = Clip(l.Q, q0, q1), r.Q = Clip(r.Q, q0, q1);
-    }
-    if (in.preserve_dU) {
-      // Keep the sign of the jump of the centre values at the face.
-      auto keep = [](double& a, double& b, double ca, double cb) {
-        if ((b - a) * (cb - ca) < 0) a = b = 0.5 * (a + b);
-      };
-      keep(l.eta, r.eta, in.eta[L], in.eta[R]);
-      keep(l.P, r.P, in.P[L], in.P[R]);
-      keep(l.Q, r.Q, in.Q[L], in.Q[R]);
+  // A second-order face falls back to first order next to a nearly dry side.
+  bool first = !kSecond;
+  if constexpr (kSecond) {
+    const double limit = 0.05 * (in.h_min + hL + hR);
+    first = in.face_limit_dry && (limit > hL || limit > hR);
+    if (!first) {
+      const double xf = in.xf[f], yf = in.yf[f];
+      const double ax = xf - in.xc[L], ay = yf - in.yc[L], bx = xf - in.xc[R], by = yf - in.yc[R];
+      const double PL = l.P, PR = r.P, QL = l.Q, QR = r.Q;
+      l.eta += in.eta_x[L] * ax + in.eta_y[L] * ay;
+      l.P += in.P_x[L] * ax + in.P_y[L] * ay;
+      l.Q += in.Q_x[L] * ax + in.Q_y[L] * ay;
+      r.eta += in.eta_x[R] * bx + in.eta_y[R] * by;
+      r.P += in.P_x[R] * bx + in.P_y[R] * by;
+      r.Q += in.Q_x[R] * bx + in.Q_y[R] * by;
+      if (in.face_value_limiter > 0) {
+        l.eta = Clip(l.eta, etaL, etaR), r.eta = Clip(r.eta, etaL, etaR);
+        l.P = Clip(l.P, PL, PR), r.P = Clip(r.P, PL, PR);
+        l.Q = Clip(l.Q, QL, QR), r.Q = Clip(r.Q, QL, QR);
+      }
+      if (in.preserve_dU) {
+        // Keep the sign of the jump of the centre values at the face.
+        auto keep = [](double& a, double& b, double ca, double cb) {
+          if ((b - a) * (cb - ca) < 0) a = b = 0.5 * (a + b);
+        };
+        keep(l.eta, r.eta, etaL, etaR);
+        keep(l.P, r.P, PL, PR);
+        keep(l.Q, r.Q, QL, QR);
+      }
     }
   }
   // Face d and face depths from d_f, except with face_average_d 0 and at the
   // faces of a second-order run that fell back to first order, where each
   // side keeps its centre d and h.
-  if (in.fad != 0 && (!first || !in.second)) {
+  if (in.fad != 0 && (!first || !kSecond)) {
     FaceDepth(l, df);
     FaceDepth(r, df);
   }
   const double kL = in.k[L], kR = in.k[R];
   const double g = in.g;
-  // Bed-slope factors g X d_f len of the two sides (X = eta + k at the centre).
-  const double bL = g * (in.eta[L] + kL) * df * len;
-  const double bR = g * (in.eta[R] + kR) * df * len;
-
+  // Bed-slope factors g X d_f |n| len of the two sides (X = eta + k at the centre).
+  const double bL = g * (etaL + kL) * df * nlen;
+  const double bR = g * (etaR + kR) * df * nlen;
   double Dx = 0.0, Dy = 0.0;
+
   if (riemann) {
     RiemannSide sl, sr;
     sl.wet = cL == kWet ? 1 : 0;
     sl.h = l.h, sl.d = l.d, sl.hp = l.h + kL, sl.P = l.P, sl.Q = l.Q;
-    if (cL == kWet && l.h >= in.h_min && l.h > 0) sl.u = l.P / l.h, sl.v = l.Q / l.h;
+    if (cL == kWet && l.h >= in.h_min && l.h > 0) {
+      const double inv = 1.0 / l.h;
+      sl.u = l.P * inv, sl.v = l.Q * inv;
+    }
     sr.wet = cR == kWet ? 1 : 0;
     sr.h = r.h, sr.d = r.d, sr.hp = r.h + kR, sr.P = r.P, sr.Q = r.Q;
-    if (cR == kWet && r.h >= in.h_min && r.h > 0) sr.u = r.P / r.h, sr.v = r.Q / r.h;
-    const RiemannFlux F = RiemannFaceFlux(sl, sr, nx, ny, in.h_min, in.solver, in.entropy_fix, len, g);
+    if (cR == kWet && r.h >= in.h_min && r.h > 0) {
+      const double inv = 1.0 / r.h;
+      sr.u = r.P * inv, sr.v = r.Q * inv;
+    }
+    const RiemannFlux F =
+        RiemannFaceFluxUnit(sl, sr, ex, ey, nn, in.h_min, in.solver, in.entropy_fix, in.len[f], g, in.sqrt_g);
     if (in.eddy) {
       EddyFlux(0.5 * (in.nu[L] + in.nu[R]), 0.5 * (hL + hR), 0.5 * (in.ux[L] + in.ux[R]),
-               0.5 * (in.uy[L] + in.uy[R]), 0.5 * (in.vx[L] + in.vx[R]), 0.5 * (in.vy[L] + in.vy[R]), nx, ny,
-               len, Dx, Dy);
+               0.5 * (in.uy[L] + in.uy[R]), 0.5 * (in.vx[L] + in.vx[R]), 0.5 * (in.vy[L] + in.vy[R]), ex, ey,
+               nlen, Dx, Dy);
     }
     const double fx = F.momx - Dx, fy = F.momy - Dy;
     s.f_mass[f] = F.mass;
     face_flux[f] = F.Fh;
     face_flux_len[f] = F.mass;
     if (cL == kWet) {
-      s.f_mx1[f] = -fx + bL * nx;
-      s.f_my1[f] = -fy + bL * ny;
+      s.f_mx1[f] = -fx + bL * ex;
+      s.f_my1[f] = -fy + bL * ey;
     } else {
       s.f_mx1[f] = s.f_my1[f] = 0.0;
     }
     if (cR == kWet) {
-      s.f_mx2[f] = fx - bR * nx;
-      s.f_my2[f] = fy - bR * ny;
+      s.f_mx2[f] = fx - bR * ex;
+      s.f_my2[f] = fy - bR * ey;
     } else {
       s.f_mx2[f] = s.f_my2[f] = 0.0;
     }
@@ -183,21 +199,21 @@ inline void InteriorFace(const FaceLoopInput& in, HdSolver& s, double* face_flux
   face_flux[f] = face_flux_len[f] = 0.0;
   if (cL == kWet) {
     const double hs = l.h;
-    const double un = (hs >= in.h_min && hs > 0) ? (l.P * nx + l.Q * ny) / hs : 0.0;
+    const double un = (hs >= in.h_min && hs > 0) ? (l.P * ex + l.Q * ey) * nn / hs : 0.0;
     const double hw = WallDepth(in.land_condition, un, hs, kL, g);
-    const double pw = 0.5 * g * (hw * hw - l.d * l.d) * len;
-    if (in.eddy) EddyFlux(in.nu[L], hs, in.ux[L], in.uy[L], in.vx[L], in.vy[L], nx, ny, len, Dx, Dy);
-    s.f_mx1[f] = -(pw * nx - Dx) + bL * nx;
-    s.f_my1[f] = -(pw * ny - Dy) + bL * ny;
+    const double pw = 0.5 * g * (hw * hw - l.d * l.d) * nlen;
+    if (in.eddy) EddyFlux(in.nu[L], hs, in.ux[L], in.uy[L], in.vx[L], in.vy[L], ex, ey, nlen, Dx, Dy);
+    s.f_mx1[f] = -(pw * ex - Dx) + bL * ex;
+    s.f_my1[f] = -(pw * ey - Dy) + bL * ey;
     s.f_mx2[f] = s.f_my2[f] = 0.0;
   } else {
     const double hs = r.h;
-    const double un = (hs >= in.h_min && hs > 0) ? -(r.P * nx + r.Q * ny) / hs : 0.0;
+    const double un = (hs >= in.h_min && hs > 0) ? -(r.P * ex + r.Q * ey) * nn / hs : 0.0;
     const double hw = WallDepth(in.land_condition, un, hs, kR, g);
-    const double pw = 0.5 * g * (hw * hw - r.d * r.d) * len;
-    if (in.eddy) EddyFlux(in.nu[R], hs, in.ux[R], in.uy[R], in.vx[R], in.vy[R], nx, ny, len, Dx, Dy);
-    s.f_mx2[f] = (pw * nx - Dx) - bR * nx;
-    s.f_my2[f] = (pw * ny - Dy) - bR * ny;
+    const double pw = 0.5 * g * (hw * hw - r.d * r.d) * nlen;
+    if (in.eddy) EddyFlux(in.nu[R], hs, in.ux[R], in.uy[R], in.vx[R], in.vy[R], ex, ey, nlen, Dx, Dy);
+    s.f_mx2[f] = (pw * ex - Dx) - bR * ex;
+    s.f_my2[f] = (pw * ey - Dy) - bR * ey;
     s.f_mx1[f] = s.f_my1[f] = 0.0;
   }
 }
@@ -208,8 +224,9 @@ FaceLoopInput GatherInput(const HdModule& hd, const HdSolver& s, const Mesh& mes
   FaceLoopInput in;
   in.e1 = mesh.faces.element1.data();
   in.e2 = mesh.faces.element2.data();
-  in.nx = mesh.faces.nx.data();
-  in.ny = mesh.faces.ny.data();
+  in.ex = s.face_ex.data();
+  in.ey = s.face_ey.data();
+  in.nn = s.face_nn.data();
   in.len = mesh.faces.length.data();
   in.eta = st.eta.data();
   in.d = st.d.data();
@@ -220,10 +237,10 @@ FaceLoopInput GatherInput(const HdModule& hd, const HdSolver& s, const Mesh& mes
   in.k = s.depth_correction.data();
   in.face_d = st.face_d.data();
   in.second = sol.scheme_of_space_discretization_horizontal == 2;
-  in.rx1 = s.rx1.data();
-  in.ry1 = s.ry1.data();
-  in.rx2 = s.rx2.data();
-  in.ry2 = s.ry2.data();
+  in.xf = mesh.faces.xf.data();
+  in.yf = mesh.faces.yf.data();
+  in.xc = mesh.elements.xc.data();
+  in.yc = mesh.elements.yc.data();
   in.eta_x = s.eta_x.data();
   in.eta_y = s.eta_y.data();
   in.P_x = s.P_x.data();
@@ -238,6 +255,7 @@ FaceLoopInput GatherInput(const HdModule& hd, const HdSolver& s, const Mesh& mes
   in.vy = st.vy.data();
   in.h_min = hd.flood_dry.mass_depth;
   in.g = kPhysical.g;
+  in.sqrt_g = std::sqrt(kPhysical.g);
   in.solver = sol.type_of_Riemann_solver;
   in.entropy_fix = sol.type_of_entropy_fix;
   in.fad = sol.face_average_d;
@@ -246,6 +264,60 @@ FaceLoopInput GatherInput(const HdModule& hd, const HdSolver& s, const Mesh& mes
   in.preserve_dU = sol.preserve_dU;
   in.face_limit_dry = sol.face_limit_dry;
   return in;
+}
+
+// Face terms of the current state: interior faces, then boundary faces, into
+// the face slots of the solver and the face mass fluxes of the state. Called
+// by every thread of a parallel region; the two face loops write disjoint
+// slots, so only the boundary loop ends with a barrier.
+void FaceTerms(HdModule& hd, HdSolver& s, const Mesh& mesh, const FaceLoopInput& in) {
+  HdState& st = hd.state;
+  double* face_flux = st.face_flux.data();
+  double* face_flux_len = st.face_flux_len.data();
+
+  const int ni = s.interior_faces.size();
+  const int* faces = s.interior_faces.data();
+  if (in.second) {
+    VHD_OMP_FOR_NOWAIT
+    for (int i = 1; i <= ni; ++i) InteriorFace<true>(in, s, face_flux, face_flux_len, faces[i]);
+  } else {
+    VHD_OMP_FOR_NOWAIT
+    for (int i = 1; i <= ni; ++i) InteriorFace<false>(in, s, face_flux, face_flux_len, faces[i]);
+  }
+
+  const int nb = s.boundary_faces.size();
+  VHD_OMP_FOR
+  for (int i = 1; i <= nb; ++i) {
+    const BoundaryFaceRecord& rec = s.boundary_faces[i];
+    if (rec.kind != kBoundaryLand) {  // open boundary: its own outer state
+      BoundaryFaceFluxHD(hd, s, mesh, rec);
+      continue;
+    }
+    st.face_flux[rec.face] = st.face_flux_len[rec.face] = 0.0;
+    if (st.wetdry[rec.element] == kWet) {
+      BoundaryFaceTerms(hd, s, mesh, rec);
+    } else {
+      ZeroFace(s, rec.face);
+    }
+  }
+}
+
+// Sums of the signed face slots of element e in its local face order.
+inline void ElementSums(const HdSolver& s, const int* start, const int* codes, int e, double& sh, double& sP,
+                        double& sQ) {
+  sh = sP = sQ = 0.0;
+  for (int k = start[e]; k < start[e + 1]; ++k) {
+    const int f = codes[k] >> 1;
+    if (codes[k] & 1) {
+      sh += s.f_mass[f];
+      sP += s.f_mx2[f];
+      sQ += s.f_my2[f];
+    } else {
+      sh -= s.f_mass[f];
+      sP += s.f_mx1[f];
+      sQ += s.f_my1[f];
+    }
+  }
 }
 
 }  // namespace
@@ -259,6 +331,11 @@ void SetupSolverHD(HdModule& hd, const Mesh& mesh, HdSolver& s) {
   const int nf = mesh.faces.nfaces;
   const FaceTable& F = mesh.faces;
   const ElementTable& E = mesh.elements;
+  // The gradient stencil first: its construction's temporaries are gone
+  // before the solver's own arrays take their memory.
+  if (hd.solution.scheme_of_space_discretization_horizontal == 2 || hd.eddy.horizontal.type > 0) {
+    SetupReconstructionHD(hd, mesh, s);
+  }
 
   int n_interior = 0, n_boundary = 0;
   for (int f = 1; f <= nf; ++f) {
@@ -283,6 +360,7 @@ void SetupSolverHD(HdModule& hd, const Mesh& mesh, HdSolver& s) {
       r.kind = kBoundaryLand;
     }
   }
+  LinkBoundaryFacesHD(hd.boundary, s);
 
   // Element -> (face, side) in the element's local face order.
   s.element_face_start.assign(ne + 1);
@@ -296,14 +374,14 @@ void SetupSolverHD(HdModule& hd, const Mesh& mesh, HdSolver& s) {
     }
   }
 
-  // Face still water depth and centroid-to-face offsets.
+  // Face still water depth, the unit normal and its length.
+  const bool second = hd.solution.scheme_of_space_discretization_horizontal == 2;
   const int fad = hd.solution.face_average_d;
   HdState& st = hd.state;
   st.face_d.assign(nf);
-  s.rx1.assign(nf);
-  s.ry1.assign(nf);
-  s.rx2.assign(nf);
-  s.ry2.assign(nf);
+  s.face_ex.assign(nf);
+  s.face_ey.assign(nf);
+  s.face_nn.assign(nf);
   for (int f = 1; f <= nf; ++f) {
     const int a = F.element1[f], b = F.element2[f];
     if (fad == 2) {
@@ -314,12 +392,10 @@ void SetupSolverHD(HdModule& hd, const Mesh& mesh, HdSolver& s) {
     } else {
       st.face_d[f] = b > 0 ? 0.5 * (st.d[a] + st.d[b]) : st.d[a];
     }
-    s.rx1[f] = F.xf[f] - E.xc[a];
-    s.ry1[f] = F.yf[f] - E.yc[a];
-    if (b > 0) {
-      s.rx2[f] = F.xf[f] - E.xc[b];
-      s.ry2[f] = F.yf[f] - E.yc[b];
-    }
+    const double nn = std::sqrt(F.nx[f] * F.nx[f] + F.ny[f] * F.ny[f]);
+    s.face_nn[f] = nn;
+    s.face_ex[f] = nn > 0 ? F.nx[f] / nn : 0.0;
+    s.face_ey[f] = nn > 0 ? F.ny[f] / nn : 0.0;
   }
 
   s.f_mass.assign(nf);
@@ -327,18 +403,17 @@ void SetupSolverHD(HdModule& hd, const Mesh& mesh, HdSolver& s) {
   s.f_my1.assign(nf);
   s.f_mx2.assign(nf);
   s.f_my2.assign(nf);
-  for (Array1<double>* a : {&s.eta_x, &s.eta_y, &s.P_x, &s.P_y, &s.Q_x, &s.Q_y, &s.src_h, &s.src_P, &s.src_Q,
-                            &s.depth_correction, &s.filter_u, &s.filter_v}) {
-    a->assign(ne, 0.0);
+  for (Array1<double>* a : {&s.src_h, &s.src_P, &s.src_Q, &s.depth_correction}) a->assign(ne, 0.0);
+  if (second) {
+    for (Array1<double>* a : {&s.eta_x, &s.eta_y, &s.P_x, &s.P_y, &s.Q_x, &s.Q_y}) a->assign(ne, 0.0);
   }
-  s.filter_weight.assign(ne);
-  for (int e = 1; e <= ne; ++e) s.filter_weight[e] = E.area[e];
+  if (second && hd.solution.type_of_filtering >= 1) {
+    s.filter_u.assign(ne, 0.0);
+    s.filter_v.assign(ne, 0.0);
+    s.filter_weight.assign(ne);
+    for (int e = 1; e <= ne; ++e) s.filter_weight[e] = E.area[e];
+  }
   s.shallow_depth_option = hd.flood_dry.type;
-  if (hd.solution.scheme_of_space_discretization_horizontal == 2 && hd.solution.gradient_limiter != 0 &&
-      hd.solution.gradient_limiter != 3) {
-    FatalError("SetupSolverHD: gradient_limiter " + std::to_string(hd.solution.gradient_limiter) +
-               " of SOLUTION_TECHNIQUE is not available in the 2D solver (use 0 none or 3 Barth-Jespersen)");
-  }
 }
 
 void BoundaryFaceTerms(const HdModule& hd, HdSolver& s, const Mesh& mesh, const BoundaryFaceRecord& rec) {
@@ -374,99 +449,106 @@ void BoundaryFaceTerms(const HdModule& hd, HdSolver& s, const Mesh& mesh, const 
 }
 
 void CalcDerivativesOnlySW2D(HdModule& hd, HdSolver& s, const Mesh& mesh) {
+  // Face terms, then the element sums in local face order divided by the area.
   HdState& st = hd.state;
   const FaceLoopInput in = GatherInput(hd, s, mesh);
-  double* face_flux = st.face_flux.data();
-  double* face_flux_len = st.face_flux_len.data();
-
-  const int ni = s.interior_faces.size();
-  const int* faces = s.interior_faces.data();
-  VHD_OMP_PARALLEL_FOR
-  for (int i = 1; i <= ni; ++i) InteriorFace(in, s, face_flux, face_flux_len, faces[i]);
-
-  const int nb = s.boundary_faces.size();
-  VHD_OMP_PARALLEL_FOR
-  for (int i = 1; i <= nb; ++i) {
-    const BoundaryFaceRecord& rec = s.boundary_faces[i];
-    st.face_flux[rec.face] = st.face_flux_len[rec.face] = 0.0;
-    if (st.wetdry[rec.element] == kWet) {
-      BoundaryFaceTerms(hd, s, mesh, rec);
-    } else {
-      ZeroFace(s, rec.face);
-    }
-  }
-
-  // Element sums in local face order, divided by the area.
-  const int ne = mesh.elements.nelements_int > 0 ? mesh.elements.nelements_int : mesh.elements.nelements;
+  const int ne =
+      mesh.elements.nelements_int > 0 ? mesh.elements.nelements_int : mesh.elements.nelements;
   const int* start = s.element_face_start.data();
   const int* codes = s.element_face_code.data();
   const double* area = mesh.elements.area.data();
-  VHD_OMP_PARALLEL_FOR
-  for (int e = 1; e <= ne; ++e) {
-    double sh = 0.0, sP = 0.0, sQ = 0.0;
-    for (int k = start[e]; k < start[e + 1]; ++k) {
-      const int f = codes[k] >> 1;
-      if (codes[k] & 1) {
-        sh += s.f_mass[f];
-        sP += s.f_mx2[f];
-        sQ += s.f_my2[f];
-      } else {
-        sh -= s.f_mass[f];
-        sP += s.f_mx1[f];
-        sQ += s.f_my1[f];
-      }
+  VHD_OMP_PARALLEL {
+    FaceTerms(hd, s, mesh, in);
+    VHD_OMP_FOR
+    for (int e = 1; e <= ne; ++e) {
+      double sh, sP, sQ;
+      ElementSums(s, start, codes, e, sh, sP, sQ);
+      const double inv = 1.0 / area[e];
+      st.dhdt[e] = sh * inv;
+      st.dPdt[e] = sP * inv;
+      st.dQdt[e] = sQ * inv;
     }
-    const double inv = 1.0 / area[e];
-    st.dhdt[e] = sh * inv;
-    st.dPdt[e] = sP * inv;
-    st.dQdt[e] = sQ * inv;
   }
 }
 
-void CALCDERIVATIVESW2D(HdModule& hd, HdSolver& s, const Mesh& mesh, int /*stage*/, double dt,
+void CALCDERIVATIVESW2D(HdModule& hd, HdSolver& s, const Mesh& mesh, int stage, double dt,
                         bool last_stage) {
-  CalcDerivativesOnlySW2D(hd, s, mesh);
-
-  // Element update of the stage from the base state of the step.
+  // Face terms, then the derivatives and the element update of the stage in
+  // one pass over the elements, all in one parallel region. The first stage
+  // takes the current state as the base of the step and keeps it in h_old,
+  // P_old, Q_old for the later stages.
   HdState& st = hd.state;
-  const int ne = mesh.elements.nelements_int > 0 ? mesh.elements.nelements_int : mesh.elements.nelements;
+  const FaceLoopInput in = GatherInput(hd, s, mesh);
+  const int ne =
+      mesh.elements.nelements_int > 0 ? mesh.elements.nelements_int : mesh.elements.nelements;
+  const int* start = s.element_face_start.data();
+  const int* codes = s.element_face_code.data();
+  const double* area = mesh.elements.area.data();
+  const bool first_stage = stage == 1;
   const double h_min = hd.flood_dry.mass_depth;
   const int damping = s.shallow_depth_option;
   const bool iterate_drag = hd.solution.bed_resistance_discretization == 2;
   constexpr double half_pi = 0.5 * std::numbers::pi;
-  VHD_OMP_PARALLEL_FOR
-  for (int e = 1; e <= ne; ++e) {
-    double hn = st.h_old[e] + dt * (st.dhdt[e] + s.src_h[e]);
-    double Pn, Qn;
-    if (st.wetdry[e] == kWet) {
-      double damp = 1.0;
-      if (damping == 1 && hn < 2.0 * h_min) damp = hn > h_min ? std::sin((hn - h_min) * half_pi / h_min) : 0.0;
-      const double dts = dt * damp;
-      const double Ps = st.P_old[e] + dts * (st.dPdt[e] + s.src_P[e]);
-      const double Qs = st.Q_old[e] + dts * (st.dQdt[e] + s.src_Q[e]);
-      const double cf = st.cf[e] + st.cf_surface[e];
-      double rdrag = 0.0;
-      if (hn > h_min && hn > 0) {
-        const double u = st.P[e] / hn, v = st.Q[e] / hn;
-        rdrag = cf * std::sqrt(u * u + v * v) / hn;
+  VHD_OMP_PARALLEL {
+    FaceTerms(hd, s, mesh, in);
+    VHD_OMP_FOR
+    for (int e = 1; e <= ne; ++e) {
+      double sh, sP, sQ;
+      ElementSums(s, start, codes, e, sh, sP, sQ);
+      const double inv = 1.0 / area[e];
+      const double dhdt = sh * inv, dPdt = sP * inv, dQdt = sQ * inv;
+      st.dhdt[e] = dhdt;
+      st.dPdt[e] = dPdt;
+      st.dQdt[e] = dQdt;
+      const double P = st.P[e], Q = st.Q[e];  // state of the stage
+      double hb, Pb, Qb;                      // base state of the step
+      if (first_stage) {
+        hb = st.h_old[e] = st.h[e];
+        Pb = st.P_old[e] = P;
+        Qb = st.Q_old[e] = Q;
+      } else {
+        hb = st.h_old[e];
+        Pb = st.P_old[e];
+        Qb = st.Q_old[e];
       }
-      Pn = Ps / (1.0 + dts * rdrag);
-      Qn = Qs / (1.0 + dts * rdrag);
-      if (iterate_drag && hn > h_min && hn > 0) {
-        const double u = Pn / hn, v = Qn / hn;
-        rdrag = cf * std::sqrt(u * u + v * v) / hn;
-        Pn = Ps / (1.0 + dts * rdrag);
-        Qn = Qs / (1.0 + dts * rdrag);
+      double hn = hb + dt * (dhdt + s.src_h[e]);
+      double Pn, Qn;
+      if (st.wetdry[e] == kWet) {
+        double damp = 1.0;
+        if (damping == 1 && hn < 2.0 * h_min)
+          damp = hn > h_min ? std::sin((hn - h_min) * half_pi / h_min) : 0.0;
+        const double dts = dt * damp;
+        const double Ps = Pb + dts * (dPdt + s.src_P[e]);
+        const double Qs = Qb + dts * (dQdt + s.src_Q[e]);
+        const double cf = st.cf[e] + st.cf_surface[e];
+        Pn = Ps;
+        Qn = Qs;
+        if (cf > 0 && hn > h_min && hn > 0) {
+          // Semi-implicit drag r = cf |u| / h, with the velocity of the stage
+          // state over the new depth, then (on request) once more with the
+          // velocity of the result.
+          const double ih = 1.0 / hn;
+          double u = P * ih, v = Q * ih;
+          double damped = 1.0 / (1.0 + dts * cf * std::sqrt(u * u + v * v) * ih);
+          Pn = Ps * damped;
+          Qn = Qs * damped;
+          if (iterate_drag) {
+            u = Pn * ih, v = Qn * ih;
+            damped = 1.0 / (1.0 + dts * cf * std::sqrt(u * u + v * v) * ih);
+            Pn = Ps * damped;
+            Qn = Qs * damped;
+          }
+        }
+      } else {
+        Pn = Pb + dt * dPdt;
+        Qn = Qb + dt * dQdt;
       }
-    } else {
-      Pn = st.P_old[e] + dt * st.dPdt[e];
-      Qn = st.Q_old[e] + dt * st.dQdt[e];
+      if (!last_stage) hn = std::max(0.0, hn);
+      st.h[e] = hn;
+      st.eta[e] = hn - st.d[e];
+      st.P[e] = Pn;
+      st.Q[e] = Qn;
     }
-    if (!last_stage) hn = std::max(0.0, hn);
-    st.h[e] = hn;
-    st.eta[e] = hn - st.d[e];
-    st.P[e] = Pn;
-    st.Q[e] = Qn;
   }
 }
 

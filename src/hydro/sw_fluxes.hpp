@@ -37,6 +37,7 @@
 #include "core/array1.hpp"
 #include "hydro/hd_module.hpp"
 #include "hydro/riemann.hpp"
+#include "mesh/gradient.hpp"
 #include "mesh/mesh.hpp"
 
 namespace vhd {
@@ -64,15 +65,19 @@ struct HdSolver {
   // the element is element1, 1: element2), compressed rows.
   Array1<int> element_face_start, element_face_code;
 
-  // Per face: offsets from the centroids of element1 and element2 to the face
-  // centre (m). (The face still water depth d_f of the bed-slope term is
-  // HdState::face_d, set here at setup.)
-  Array1<double> rx1, ry1, rx2, ry2;
+  // Per face: the unit normal (ex, ey) and the length nn of the mesh normal
+  // (nx = nn ex; nn is 1 on Cartesian meshes). (The face still water depth
+  // d_f of the bed-slope term is HdState::face_d, set here at setup.)
+  Array1<double> face_ex, face_ey, face_nn;
 
   // Per face contributions of the current stage, one slot per side, already
   // signed for that side: mass (m3/s) and momentum (m4/s2).
   Array1<double> f_mass, f_mx1, f_my1, f_mx2, f_my2;
 
+  // Gradient stencil (second order or eddy viscosity), built once at setup,
+  // and the unlimited gradients read by the ENO and weighted limiters.
+  GradientStencil gradient;
+  Array1<double> gradient_x, gradient_y;
   // Per element: limited gradients of eta, P, Q (second order).
   Array1<double> eta_x, eta_y, P_x, P_y, Q_x, Q_y;
   // Element source terms of the stage, filled by forcings and sources: depth
@@ -80,7 +85,8 @@ struct HdSolver {
   Array1<double> src_h, src_P, src_Q;
   // Element depth correction k (m), zero in ordinary runs.
   Array1<double> depth_correction;
-  // Weight of the velocity filter (element area, m2), and scratch for it.
+  // Weight of the velocity filter (element area, m2), and scratch for it
+  // (allocated when the filter is on).
   Array1<double> filter_weight, filter_u, filter_v;
 
   // Shallow-water damping option of the element update: 0 none; 1 momentum
@@ -99,14 +105,16 @@ struct HdSolver {
 // every work array. Called once after SetupHD.
 void SetupSolverHD(HdModule& hd, const Mesh& mesh, HdSolver& solver);
 
-// Derivatives of one stage and the element update: base state h_old, P_old,
-// Q_old; stage step dt_stage (s); last_stage is true for the final stage of
-// the step (the depth is cut at 0 after every other stage).
+// Derivatives of one stage and the element update, in one pass over the
+// elements after the face loops. Stage 1 takes the current state as the base
+// of the step and stores it in h_old, P_old, Q_old; later stages advance from
+// that base. dt_stage is the stage step (s); last_stage is true for the final
+// stage of the step (the depth is cut at 0 after every other stage).
 void CALCDERIVATIVESW2D(HdModule& hd, HdSolver& solver, const Mesh& mesh, int stage, double dt_stage,
                         bool last_stage);
 
 // Face and element sums only (no update): fills dhdt, dPdt, dQdt of the
-// current state. Used by CALCDERIVATIVESW2D and by tests of balance.
+// current state. Used for the initial state and by tests of balance.
 void CalcDerivativesOnlySW2D(HdModule& hd, HdSolver& solver, const Mesh& mesh);
 
 // Velocity filter after a stage (second order, type_of_filtering >= 1).

@@ -13,14 +13,44 @@ namespace {
 
 constexpr double kRadToDeg = 57.29577951308232;
 
-void CopyBaseState(HdState& st) {
-  const int ne = st.nelements_owned;
-  VHD_OMP_PARALLEL_FOR
+// The end of a sub-step in one pass over the elements: the velocities from
+// the fluxes (every element, halo included, as CALCVELOCITYFROMFLUX), the bed
+// shear stress of the new state (owned elements, as CALCBEDSHEARSTRESS), and
+// the blow-up test of CheckBlowUpHD. Returns true when an owned element fails
+// that test, so that CheckBlowUpHD walks the elements only then.
+bool VelocityStressAndBlowUpTest(HdModule& hd) {
+  HdState& st = hd.state;
+  const int ne = st.nelements, nown = st.nelements_owned;
+  const double rho0 = kPhysical.rho0;
+  const double limit = hd.flood_dry.elevation_limit;
+  const bool depth_test = hd.flood_dry.type <= 0;
+  const int* code = st.wetdry.data();
+  const double* h = st.h.data();
+  const double* eta = st.eta.data();
+  const double* P = st.P.data();
+  const double* Q = st.Q.data();
+  const double* cf = st.cf.data();
+  double* u = st.u.data();
+  double* v = st.v.data();
+  double* tau_x = st.tau_x.data();
+  double* tau_y = st.tau_y.data();
+  int failed = 0;
+  VHD_OMP_PARALLEL_FOR_REDUCTION(max, failed)
   for (int e = 1; e <= ne; ++e) {
-    st.h_old[e] = st.h[e];
-    st.P_old[e] = st.P[e];
-    st.Q_old[e] = st.Q[e];
+    double ue = 0.0, ve = 0.0;
+    if (code[e] == kWet && h[e] > 0.0) {
+      ue = P[e] / h[e];
+      ve = Q[e] / h[e];
+    }
+    u[e] = ue;
+    v[e] = ve;
+    if (e > nown) continue;
+    const double speed = std::sqrt(ue * ue + ve * ve);
+    tau_x[e] = rho0 * cf[e] * ue * speed;
+    tau_y[e] = rho0 * cf[e] * ve * speed;
+    if (!(eta[e] <= limit) || (depth_test && !(h[e] > 0.0))) failed = 1;
   }
+  return failed != 0;
 }
 
 }  // namespace
@@ -122,6 +152,8 @@ void InitialStepHD(HdModule& hd, HdSolver& solver, const Mesh& mesh) {
   HdState& st = hd.state;
   CALCVELOCITYFROMFLUX(st);
   for (int f = 1; f <= st.face_flux.size(); ++f) st.face_flux[f] = st.face_flux_len[f] = 0.0;
+  // Boundary values at the first time of the run (both values of each pair).
+  UpdateBoundaryValuesHD(hd, mesh, hd.time_axis.TimeOfStep(hd.time_axis.first_step));
   if (hd.solution.scheme_of_space_discretization_horizontal == 2 || hd.eddy.horizontal.type > 0) {
     UpdateGradientsHD(hd, solver, mesh);
   }
@@ -137,12 +169,25 @@ void StepHD(HdModule& hd, HdSolver& solver, const Mesh& mesh, double t, double d
   start(kHdTimerTotal);
 
   RecordTimeStepHD(hd, dt);
+  // CFL numbers; the report walks the elements again only when one of them
+  // is violated.
   const int ne = st.nelements_owned;
-  VHD_OMP_PARALLEL_FOR
-  for (int e = 1; e <= ne; ++e) st.cfl[e] = st.cfl_rate[e] >= 0 ? st.cfl_rate[e] * dt : kCflFloor;
-  ReportCflViolations("CFL condition violated in HD calculation", mesh, st.cfl, st.wetdry, &st.d, t, dt,
-                      hd.n_cfl_violations, hd.time_step.maximum_number_of_errors, hd.time_step.error_level);
+  int violated = 0;
+  VHD_OMP_PARALLEL_FOR_REDUCTION(max, violated)
+  for (int e = 1; e <= ne; ++e) {
+    const double cfl = st.cfl_rate[e] >= 0 ? st.cfl_rate[e] * dt : kCflFloor;
+    st.cfl[e] = cfl;
+    if (cfl > 1.00001 && st.wetdry[e] == kWet) violated = 1;
+  }
+  if (violated) {
+    ReportCflViolations("CFL condition violated in HD calculation", mesh, st.cfl, st.wetdry, &st.d, t, dt,
+                        hd.n_cfl_violations, hd.time_step.maximum_number_of_errors, hd.time_step.error_level);
+  }
   const double t_new = t + dt;
+
+  start(kHdTimerForcings);
+  UpdateBoundaryValuesHD(hd, mesh, t_new);
+  stop(kHdTimerForcings);
 
   start(kHdTimerProperties);
   CALCRESISTANCEBED(hd, mesh, t_new);
@@ -152,7 +197,6 @@ void StepHD(HdModule& hd, HdSolver& solver, const Mesh& mesh, double t, double d
   }
   stop(kHdTimerProperties);
 
-  CopyBaseState(st);
   const bool two_stage = hd.solution.scheme_of_time_integration == 2;
   const bool second = hd.solution.scheme_of_space_discretization_horizontal == 2;
   const int nstages = two_stage ? 2 : 1;
@@ -168,10 +212,10 @@ void StepHD(HdModule& hd, HdSolver& solver, const Mesh& mesh, double t, double d
   start(kHdTimerFloodDry);
   if (hd.time_step.CFL_correction_HD == 1) CHECKTIMESTEPHD(hd, mesh, dt);
   CHECKFLOODDRYHD(hd, mesh);
-  CALCVELOCITYFROMFLUX(st);
-  CALCBEDSHEARSTRESS(hd);
-  int status = 0;
-  if (!CheckBlowUpHD(hd, mesh, t_new, &status)) run_status = -1;
+  if (VelocityStressAndBlowUpTest(hd)) {
+    int status = 0;
+    if (!CheckBlowUpHD(hd, mesh, t_new, &status)) run_status = -1;
+  }
   stop(kHdTimerFloodDry);
   stop(kHdTimerTotal);
 }
