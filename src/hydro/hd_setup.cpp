@@ -62,6 +62,7 @@ void SetupHD(HdModule& hd, const RunControl& run, const TimeAxis& time, const Mo
   SktReadKeyword("mode", hd.mode, 2);
   if (hd.mode != modules.hd) FatalError("mode is illegal");
   if (hd.mode < 1) {
+    SktSkipSection();
     SktCloseSection();
     return;
   }

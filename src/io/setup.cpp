@@ -38,6 +38,7 @@ struct SetupState {
   std::vector<Frame> opened;                  // every section opened, once
   std::set<const toml::node*> used_keys;      // keyword nodes asked for
   std::set<const toml::node*> used_values;    // parameter nodes read
+  std::set<const toml::table*> skipped;       // sections skipped on purpose, with all below them
 };
 
 SetupState& State() {
@@ -371,6 +372,7 @@ void SktClose() {
   s.opened.clear();
   s.used_keys.clear();
   s.used_values.clear();
+  s.skipped.clear();
 }
 
 bool SktIsOpen() { return State().root != nullptr; }
@@ -444,6 +446,26 @@ void SktOpenSection(std::string_view name, int index, int* status, bool log, int
 void SktCloseSection() {
   SetupState& s = State();
   if (!s.stack.empty()) s.stack.pop_back();
+}
+
+namespace {
+
+void MarkSkipped(const toml::table& table, std::set<const toml::table*>& skipped) {
+  skipped.insert(&table);
+  for (const auto& [key, node] : table) {
+    if (const toml::table* t = node.as_table()) {
+      MarkSkipped(*t, skipped);
+    } else if (node.is_array_of_tables()) {
+      for (const toml::node& e : *node.as_array()) MarkSkipped(*e.as_table(), skipped);
+    }
+  }
+}
+
+}  // namespace
+
+void SktSkipSection() {
+  SetupState& s = State();
+  if (!s.stack.empty()) MarkSkipped(*s.stack.back().table, s.skipped);
 }
 
 bool SktSectionExists(std::string_view name, int index) { return SktNumberOfSectionInstances(SectionName(name, index)) > 0; }
@@ -529,6 +551,7 @@ void SktReportUnusedKeywords() {
   };
   std::vector<Unused> unused;
   for (const Frame& f : s.opened) {
+    if (s.skipped.count(f.table)) continue;
     for (const auto& [key, node] : *f.table) {
       if (IsSection(node)) continue;
       const std::string where = fmt::format("Keyword {} in section {}, line {}", key.str(), f.path, LineOf(node));

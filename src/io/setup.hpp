@@ -57,6 +57,12 @@ void SktOpenTarget(std::string_view name, int* status = nullptr);
 void SktOpenSection(std::string_view name, int index = kNoIndex, int* status = nullptr,
                     bool log = true, int instance = 1);
 void SktCloseSection();
+// Marks the current section and every section below it as deliberately
+// skipped: the program opened it only to decide not to read it (an output with
+// include = 0, a module switched off). SktReportUnusedKeywords reports none of
+// their keywords that no reader asked for. The section stays current: close it
+// with SktCloseSection as usual. No effect without a current section.
+void SktSkipSection();
 // Queries on the current section (no logging, no error).
 bool SktSectionExists(std::string_view name, int index = kNoIndex);
 int SktNumberOfSectionInstances(std::string_view name);
@@ -98,7 +104,7 @@ void SktReadKeyword(std::string_view key, std::vector<double>& values, int n,
 // After all module setups: a warning for every keyword of an opened section
 // that no reader asked for, naming its path and line, and for the parameters
 // of a keyword that no reader read ("dt = [30, 40]" read as one value).
-// Sections never opened are not reported.
+// Sections never opened, and sections skipped with SktSkipSection, are not reported.
 void SktReportUnusedKeywords();
 
 }  // namespace vhd

@@ -30,6 +30,10 @@ namespace {
 
 constexpr const char* kSource = "VantorHD " VHD_VERSION;
 constexpr const char* kMesh = "mesh2d";
+// Attributes of a coordinate variable x, y or z holding the axis exactly: the
+// coordinate values cannot give the spacing of a single-cell axis.
+constexpr const char* kAxisOrigin = "zrn_axis_origin";
+constexpr const char* kAxisSpacing = "zrn_axis_spacing";
 
 struct NcFailure {
   std::string what;
@@ -228,9 +232,18 @@ void AddStatistics(ZrnItemInfo& it, const T* data, long n, double delete_value) 
 
 // ---- creating a file ------------------------------------------------------------------
 
+// A coordinate variable defined in this define-mode pass; its values are
+// written once the definitions end.
+struct NewCoordinate {
+  const char* name;
+  int n;
+  double x0, dx;
+};
+
 struct SpatialDims {
   int x = -1, y = -1, z = -1;
   int nodes = -1, faces = -1, volumes = -1, max_face_nodes = -1, edges = -1, two = -1;
+  std::vector<NewCoordinate> new_coordinates;
 };
 
 // Dimension ids of an axis, creating dimensions and coordinate variables as
@@ -238,7 +251,8 @@ struct SpatialDims {
 int AxisDims(ZrnFile& f, SpatialDims& d, const ZrnSpatialAxis& a, int* ids) {
   const int ncid = f.ncid;
   const bool geo = IsLongLat(f.projection);
-  auto coordinate = [&](int& dim, const char* name, int n, const char* axis_name) {
+  auto coordinate = [&](int& dim, const char* name, int k, const char* axis_name) {
+    const int n = a.n[k];
     if (dim >= 0) {
       size_t len = 0;
       Check(nc_inq_dimlen(ncid, dim, &len), "dimension");
@@ -248,6 +262,9 @@ int AxisDims(ZrnFile& f, SpatialDims& d, const ZrnSpatialAxis& a, int* ids) {
     Check(nc_def_dim(ncid, name, static_cast<size_t>(n), &dim), std::string("dimension ") + name);
     int var = -1;
     Check(nc_def_var(ncid, name, NC_DOUBLE, 1, &dim, &var), std::string("variable ") + name);
+    PutDouble(ncid, var, kAxisOrigin, a.x0[k]);
+    PutDouble(ncid, var, kAxisSpacing, a.dx[k]);
+    d.new_coordinates.push_back(NewCoordinate{name, n, a.x0[k], a.dx[k]});
     const std::string ax = axis_name;
     if (ax == "X") {
       PutText(ncid, var, "standard_name", geo ? "longitude" : "projection_x_coordinate");
@@ -274,15 +291,15 @@ int AxisDims(ZrnFile& f, SpatialDims& d, const ZrnSpatialAxis& a, int* ids) {
   };
   switch (a.type) {
     case kZrnAxisD0: return 0;
-    case kZrnAxisD1: ids[0] = coordinate(d.x, "x", a.n[0], "X"); return 1;
+    case kZrnAxisD1: ids[0] = coordinate(d.x, "x", 0, "X"); return 1;
     case kZrnAxisD2:
-      ids[0] = coordinate(d.y, "y", a.n[1], "Y");
-      ids[1] = coordinate(d.x, "x", a.n[0], "X");
+      ids[0] = coordinate(d.y, "y", 1, "Y");
+      ids[1] = coordinate(d.x, "x", 0, "X");
       return 2;
     case kZrnAxisD3:
-      ids[0] = coordinate(d.z, "z", a.n[2], "Z");
-      ids[1] = coordinate(d.y, "y", a.n[1], "Y");
-      ids[2] = coordinate(d.x, "x", a.n[0], "X");
+      ids[0] = coordinate(d.z, "z", 2, "Z");
+      ids[1] = coordinate(d.y, "y", 1, "Y");
+      ids[2] = coordinate(d.x, "x", 0, "X");
       return 3;
     case kZrnAxisD4:
       if (a.location == kZrnLocationFace) ids[0] = mesh_dim(d.faces, "mesh2d_nFaces", a.n[0]);
@@ -293,12 +310,15 @@ int AxisDims(ZrnFile& f, SpatialDims& d, const ZrnSpatialAxis& a, int* ids) {
   }
 }
 
-void PutCoordinateValues(int ncid, const char* name, int n, double x0, double dx) {
-  int var = -1;
-  if (nc_inq_varid(ncid, name, &var) != NC_NOERR) return;
-  std::vector<double> v(static_cast<size_t>(n));
-  for (int i = 0; i < n; ++i) v[static_cast<size_t>(i)] = x0 + i * dx;
-  Check(nc_put_var_double(ncid, var, v.data()), std::string("values of ") + name);
+// Values of the coordinate variables defined by AxisDims (data mode).
+void PutCoordinateValues(int ncid, const SpatialDims& d) {
+  for (const NewCoordinate& c : d.new_coordinates) {
+    int var = -1;
+    Check(nc_inq_varid(ncid, c.name, &var), std::string("variable ") + c.name);
+    std::vector<double> v(static_cast<size_t>(c.n));
+    for (int i = 0; i < c.n; ++i) v[static_cast<size_t>(i)] = c.x0 + i * c.dx;
+    Check(nc_put_var_double(ncid, var, v.data()), std::string("values of ") + c.name);
+  }
 }
 
 // The attributes and variable of one item (define mode).
@@ -651,14 +671,7 @@ int CreateFile(ZrnFile& f) {
       f.item_varid.push_back(DefineItemVariable(f, dims, time_dim, f.items[k], true,
                                                 static_cast<int>(k + 1), have_crs));
     Check(nc_enddef(ncid), "end of definitions");
-    if (!f.items.empty()) {
-      const ZrnSpatialAxis& a = f.items.front().axis;
-      if (a.type >= kZrnAxisD1 && a.type <= kZrnAxisD3)
-        PutCoordinateValues(ncid, "x", a.n[0], a.x0[0], a.dx[0]);
-      if (a.type >= kZrnAxisD2 && a.type <= kZrnAxisD3)
-        PutCoordinateValues(ncid, "y", a.n[1], a.x0[1], a.dx[1]);
-      if (a.type == kZrnAxisD3) PutCoordinateValues(ncid, "z", a.n[2], a.x0[2], a.dx[2]);
-    }
+    PutCoordinateValues(ncid, dims);
     if (mesh) WriteMesh(f, mesh_vars, max_nodes, edges);
     Check(nc_sync(ncid), "flush");
   } catch (const NcFailure& e) {
@@ -760,21 +773,76 @@ int DimLen(int ncid, int dim) {
   return static_cast<int>(len);
 }
 
-// Origin and spacing of an axis from its coordinate variable (0 and 1 when none).
+// Origin and spacing of the axis along dimension dim (0 and 1 without a
+// coordinate variable). Our files keep both as attributes of the coordinate
+// variable: exact, and the only record of the spacing of a single-cell axis.
+// Files of other tools give them by the coordinate values (spacing over the
+// whole span); so do ours once another tool has cut or reversed the axis:
+// attributes that disagree with the values give way to them.
 void AxisFromCoordinate(int ncid, int dim, int n, double& x0, double& dx) {
   x0 = 0.0;
   dx = 1.0;
-  int var = -1;
-  if (nc_inq_varid(ncid, DimName(ncid, dim).c_str(), &var) != NC_NOERR || n < 1) return;
+  const std::string name = DimName(ncid, dim);
+  int var = -1, ndims = 0, vdim = -1;
+  if (n < 1 || nc_inq_varid(ncid, name.c_str(), &var) != NC_NOERR) return;
+  Check(nc_inq_varndims(ncid, var, &ndims), "coordinate " + name);
+  if (ndims != 1) return;  // not a coordinate variable (a curvilinear grid's 2D x)
+  Check(nc_inq_vardimid(ncid, var, &vdim), "coordinate " + name);
+  if (vdim != dim) return;
   std::vector<double> v(static_cast<size_t>(n));
-  if (nc_get_var_double(ncid, var, v.data()) != NC_NOERR) return;
-  x0 = v[0];
-  if (n >= 2 && v[1] != v[0]) dx = v[1] - v[0];
+  Check(nc_get_var_double(ncid, var, v.data()), "values of coordinate " + name);
+  const double first = v.front(), last = v.back();
+  if (!std::isfinite(first) || !std::isfinite(last))
+    throw NcFailure{"coordinate " + name + " has values missing"};
+  x0 = first;
+  if (n >= 2 && last != first) dx = (last - first) / (n - 1);
+  double origin = 0.0, spacing = 0.0;
+  if (!GetDouble(ncid, var, kAxisOrigin, origin) || !GetDouble(ncid, var, kAxisSpacing, spacing) ||
+      !std::isfinite(origin) || !std::isfinite(spacing) || spacing == 0.0)
+    return;
+  const double tol = 1e-9 * std::max({std::fabs(first), std::fabs(last), std::fabs(spacing)});
+  const bool same_origin = std::fabs(origin - first) <= tol;
+  if (n == 1) {
+    dx = spacing;
+    if (same_origin) x0 = origin;
+  } else if (same_origin && std::fabs(spacing - dx) <= tol) {
+    x0 = origin;
+    dx = spacing;
+  }
 }
 
 struct MeshDims {
   int nodes = -1, faces = -1, volumes = -1;
 };
+
+std::string AxisText(int n, double x0, double dx) {
+  char text[96];
+  std::snprintf(text, sizeof text, "%d from %.10g by %.10g", n, x0, dx);
+  return text;
+}
+
+// How a grid axis differs from the coordinates x, y, z the file already has
+// ("" when it fits them or the file has none of them).
+std::string OtherAxisInFile(int ncid, const ZrnSpatialAxis& a) {
+  static const char* const kNames[3] = {"x", "y", "z"};
+  if (a.type < kZrnAxisD1 || a.type > kZrnAxisD3) return "";
+  try {
+    for (int k = 0; k < a.type; ++k) {
+      int dim = -1;
+      if (nc_inq_dimid(ncid, kNames[k], &dim) != NC_NOERR) continue;
+      const int n = DimLen(ncid, dim);
+      double x0 = 0.0, dx = 0.0;
+      AxisFromCoordinate(ncid, dim, n, x0, dx);
+      const double tol = 1e-9 * std::max({std::fabs(x0), std::fabs(x0 + (n - 1) * dx), std::fabs(dx)});
+      if (n != a.n[k] || std::fabs(x0 - a.x0[k]) > tol || std::fabs(dx - a.dx[k]) > tol)
+        return std::string("axis ") + kNames[k] + " (" + AxisText(a.n[k], a.x0[k], a.dx[k]) +
+               ") differs from the file's (" + AxisText(n, x0, dx) + ")";
+    }
+  } catch (const NcFailure& e) {
+    return e.what;
+  }
+  return "";
+}
 
 ZrnSpatialAxis AxisOfVariable(int ncid, const VarInfo& v, std::size_t first,
                               const MeshDims& md) {
@@ -1447,9 +1515,14 @@ int zrnStaticCreate(ZrnFile& f, const ZrnItemInfo& info, int& static_no, int* st
   if (f.ncid < 0 || !f.can_write)
     return Finish(f, Fail(f, kZrnErrWriteStatic, "file is not open for writing"), status);
   if (f.dynamic_started) return Finish(f, Fail(f, kZrnErrStaticWriteAfterDynamic, ""), status);
-  if (info.name.empty() || info.axis.Count() < 1 ||
-      (info.precision != kZrnFloat && info.precision != kZrnDouble))
+  if (info.name.empty() || (info.precision != kZrnFloat && info.precision != kZrnDouble))
     return Finish(f, Fail(f, kZrnErrItem, "static item '" + info.name + "'"), status);
+  const std::string problem = zrn_detail::AxisProblem(info.axis);
+  if (!problem.empty())
+    return Finish(f, Fail(f, kZrnErrSpatialAxis, "static item '" + info.name + "': " + problem), status);
+  const std::string other = OtherAxisInFile(f.ncid, info.axis);
+  if (!other.empty())
+    return Finish(f, Fail(f, kZrnErrSpatialAxis, "static item '" + info.name + "': " + other), status);
   ZrnItemInfo it = info;
   it.nvalues = 0;
   int code = kZrnOk;
@@ -1468,12 +1541,7 @@ int zrnStaticCreate(ZrnFile& f, const ZrnItemInfo& info, int& static_no, int* st
     const int var = DefineItemVariable(f, d, -1, it, false,
                                        static_cast<int>(f.statics.size()) + 1, have_crs);
     Check(nc_enddef(f.ncid), "end of definitions");
-    const ZrnSpatialAxis& a = it.axis;
-    if (a.type >= kZrnAxisD1 && a.type <= kZrnAxisD3 && d.x >= 0)
-      PutCoordinateValues(f.ncid, "x", a.n[0], a.x0[0], a.dx[0]);
-    if (a.type >= kZrnAxisD2 && a.type <= kZrnAxisD3 && d.y >= 0)
-      PutCoordinateValues(f.ncid, "y", a.n[1], a.x0[1], a.dx[1]);
-    if (a.type == kZrnAxisD3) PutCoordinateValues(f.ncid, "z", a.n[2], a.x0[2], a.dx[2]);
+    PutCoordinateValues(f.ncid, d);
     f.statics.push_back(it);
     f.static_varid.push_back(var);
     static_no = static_cast<int>(f.statics.size());

@@ -46,6 +46,26 @@ int TimeAxisFromText(const std::string& text) {
   return kZrnTimeUndefined;
 }
 
+std::string AxisProblem(const ZrnSpatialAxis& a) {
+  static const char* const kNames[3] = {"x", "y", "z"};
+  if (a.type == kZrnAxisD4) {
+    if (a.n[0] < 1) return "mesh item without values";
+    if (a.location != kZrnLocationFace && a.location != kZrnLocationNode &&
+        a.location != kZrnLocationVolume)
+      return "mesh location " + std::to_string(a.location);
+    return "";
+  }
+  if (a.type < kZrnAxisD0 || a.type > kZrnAxisD3) return "undefined spatial axis";
+  for (int k = 0; k < a.type; ++k) {
+    const std::string which = kNames[k];
+    if (a.n[k] < 1) return "size of " + which + " is " + std::to_string(a.n[k]);
+    if (!std::isfinite(a.x0[k])) return "origin of " + which + " is not finite";
+    if (!std::isfinite(a.dx[k]) || a.dx[k] == 0.0)
+      return "spacing of " + which + " must be finite and non-zero";
+  }
+  return "";
+}
+
 }  // namespace zrn_detail
 
 using zrn_detail::Fail;
@@ -471,13 +491,8 @@ int SetAxisOf(ZrnFile& f, int item, const ZrnSpatialAxis& axis) {
   int code = kZrnOk;
   ZrnItemInfo* it = WritableItem(f, item, code);
   if (it == nullptr) return code;
-  for (int k = 0; k < 3; ++k)
-    if (axis.n[k] < 1 || !std::isfinite(axis.x0[k]) || !std::isfinite(axis.dx[k]) ||
-        (axis.type != kZrnAxisD4 && axis.dx[k] <= 0.0))
-      return Fail(f, kZrnErrSpatialAxis, "item " + std::to_string(item) + " axis sizes");
-  if (axis.type == kZrnAxisD4 && axis.location != kZrnLocationFace &&
-      axis.location != kZrnLocationNode && axis.location != kZrnLocationVolume)
-    return Fail(f, kZrnErrSpatialAxis, "item " + std::to_string(item) + " mesh location");
+  const std::string problem = zrn_detail::AxisProblem(axis);
+  if (!problem.empty()) return Fail(f, kZrnErrSpatialAxis, "item " + std::to_string(item) + ": " + problem);
   it->axis = axis;
   return kZrnOk;
 }

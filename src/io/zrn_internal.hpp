@@ -18,5 +18,9 @@ int Fail(ZrnFile& f, int code, const std::string& detail);
 // The time axis name written to and read from `zrn_time_axis`.
 const char* TimeAxisText(int type);
 int TimeAxisFromText(const std::string& text);
+// What is wrong with a spatial axis ("" when nothing): sizes below 1, an
+// origin or spacing that is not finite, a zero spacing (a negative spacing is
+// a descending axis), an unknown mesh location.
+std::string AxisProblem(const ZrnSpatialAxis& a);
 
 }  // namespace vhd::zrn_detail

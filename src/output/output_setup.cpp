@@ -557,6 +557,7 @@ void SetupOutputs(OutputList& list, const OutputModuleInfo& info, const Mesh& me
     spec.number = i;
     spec.section = SktSectionPath();
     SktReadKeyword("include", spec.include, 1);
+    if (spec.include != 1) SktSkipSection();
     if (spec.include == 1) {
       ReadOutput(spec, list, info, mesh, run, time);
       const bool empty_area = spec.domain == OutputDomain::kArea && spec.file_kind == 4 && spec.elements.empty();

@@ -394,5 +394,69 @@ TEST_F(SetupTest, UnusedKeywordsOfOpenedSectionsAreWarned) {
   EXPECT_EQ(test::ReadTextFile(log_path).find("anything"), std::string::npos);
 }
 
+// A section opened only to find that it is switched off is skipped: none of
+// its keywords, nor those of the sections below it, are reported, while its
+// siblings and the instances next to it still are.
+TEST_F(SetupTest, SkippedSectionsAreNotReportedKeyByKey) {
+  Open("[VantorHD.OUTPUTS]\n"
+       "number_of_outputs = 2\n"
+       "[VantorHD.OUTPUTS.OUTPUT_1]\n"
+       "include = 1\n"
+       "file_name = \"a.zrnu\"\n"
+       "titel = \"typo\"\n"
+       "[VantorHD.OUTPUTS.OUTPUT_2]\n"
+       "include = 0\n"
+       "file_name = \"b.zrnu\"\n"
+       "first_time_step = [0, 1]\n"
+       "[VantorHD.OUTPUTS.OUTPUT_2.POINTS]\n"
+       "number_of_points = 1\n"
+       "[[VantorHD.OUTPUTS.OUTPUT_2.POINTS.POINT]]\n"
+       "x = 1.0\n"
+       "[[VantorHD.SOURCE]]\n"
+       "name = \"river\"\n"
+       "flow = 1.0\n"
+       "[[VantorHD.SOURCE]]\n"
+       "name = \"outfall\"\n"
+       "flow = 2.0\n");
+  SktSkipSection();  // nothing is current yet: no effect
+  SktOpenTarget("VantorHD");
+  SktOpenSection("OUTPUTS", kNoIndex, nullptr, false);
+  int n = 0, include = 0;
+  SktReadKeyword("number_of_outputs", n);
+  for (int i = 1; i <= n; ++i) {
+    SktOpenSection("OUTPUT", i, nullptr, false);
+    SktReadKeyword("include", include, 1);
+    if (include == 1) {
+      std::string name;
+      SktReadFileName("file_name", name);
+    } else {
+      SktSkipSection();
+      // A section below a skipped one stays skipped when opened later.
+      SktOpenSection("POINTS", kNoIndex, nullptr, false);
+      SktOpenSection("POINT", kNoIndex, nullptr, false);
+      SktCloseSection();
+      SktCloseSection();
+    }
+    SktCloseSection();
+  }
+  SktCloseSection();
+  for (int k = 1; k <= 2; ++k) {
+    SktOpenSection("SOURCE", kNoIndex, nullptr, false, k);
+    std::string name;
+    SktReadKeyword("name", name);
+    if (name == "outfall") SktSkipSection();
+    SktCloseSection();
+  }
+  SktReportUnusedKeywords();
+  const std::string log = test::ReadTextFile(log_path);
+  const std::vector<std::string> body = Body();
+  std::vector<std::string> warnings;
+  for (std::size_t k = 0; k < body.size(); ++k)
+    if (body[k].rfind("Warning:", 0) == 0) warnings.push_back(Unwrap(body, k, 9));
+  ASSERT_EQ(warnings.size(), 2u) << log;
+  EXPECT_EQ(warnings[0], "Warning: Keyword titel in section VantorHD/OUTPUTS/OUTPUT_1, line 6: not used");
+  EXPECT_EQ(warnings[1], "Warning: Keyword flow in section VantorHD/SOURCE, line 17: not used");
+}
+
 }  // namespace
 }  // namespace vhd

@@ -6,6 +6,7 @@
 #include <netcdf.h>
 #include <unistd.h>
 
+#include <cmath>
 #include <filesystem>
 #include <vector>
 
@@ -88,7 +89,9 @@ TEST(ZrnErrors, HeaderItemsAndAxes) {
   EXPECT_EQ(zrnSetItemValueType(f, 1, 9, &status), kZrnErrItem);
   EXPECT_EQ(zrnItemEnableCompression(f, 1, 11, &status), kZrnErrItem);
   EXPECT_EQ(zrnSetItemAxisEqD1(f, 1, 0, 0.0, 1.0, &status), kZrnErrSpatialAxis);
-  EXPECT_EQ(zrnSetItemAxisEqD1(f, 1, 5, 0.0, -1.0, &status), kZrnErrSpatialAxis);
+  EXPECT_EQ(zrnSetItemAxisEqD1(f, 1, 5, 0.0, 0.0, &status), kZrnErrSpatialAxis);
+  EXPECT_EQ(zrnSetItemAxisEqD2(f, 1, 5, 4, 0.0, 0.0, 1.0, std::nan(""), &status), kZrnErrSpatialAxis);
+  EXPECT_EQ(zrnSetItemAxisEqD3(f, 1, 5, 4, 0, 0.0, 0.0, 0.0, 1.0, 1.0, 1.0, &status), kZrnErrSpatialAxis);
   EXPECT_EQ(zrnSetItemAxisEqD4(f, 1, 9, 5, &status), kZrnErrSpatialAxis);
   EXPECT_EQ(zrnSetEqCalendarAxis(f, kStart, 0.0, &status), kZrnErrTimeAxis);
   EXPECT_EQ(zrnSetEqCalendarAxis(f, ZrnDateTime{2010, 2, 30, 0, 0, 0}, 60.0, &status),
@@ -164,6 +167,47 @@ TEST(ZrnErrors, WritingRecords) {
   ASSERT_EQ(zrnFileRead(r, series), 0);
   EXPECT_EQ(zrnWriteItemTimeStep(r, 0.0, two, 1, &status), kZrnErrWriteDynamic);
   EXPECT_EQ(zrnStaticWrite(r, 1, two, 1, &status), kZrnErrWriteStatic);
+  zrnFileClose(r);
+}
+
+// A static item shares the file's x and y: one that places them elsewhere
+// would move the dynamic items' grid, so it is refused and the grid stays.
+TEST(ZrnErrors, StaticItemMustFitTheGridOfTheFile) {
+  test::TempDir dir;
+  int status = 0;
+  ZrnFile f;
+  const std::string name = dir.file("g.zrn2");
+  zrnHeaderCreate(f, name, kZrnFileData, "g");
+  zrnSetEqCalendarAxis(f, kStart, 60.0);
+  zrnSetItemInfo(f, 1, "Level", kUvqIWaterLevel, kUvqUmeter);
+  zrnSetItemAxisEqD2(f, 1, 3, 2, 100.0, 200.0, 10.0, -20.0);
+  ASSERT_EQ(zrnFileCreate(f), 0);
+  ZrnItemInfo info;
+  info.name = "Bed level";
+  info.axis = f.items[0].axis;
+  int sno = 0;
+  info.axis.x0[0] = 105.0;
+  EXPECT_EQ(zrnStaticCreate(f, info, sno, &status), kZrnErrSpatialAxis);
+  EXPECT_NE(f.detail.find("axis x"), std::string::npos) << f.detail;
+  info.axis.x0[0] = 100.0;
+  info.axis.dx[1] = 20.0;
+  EXPECT_EQ(zrnStaticCreate(f, info, sno, &status), kZrnErrSpatialAxis);
+  info.axis.dx[1] = 0.0;
+  EXPECT_EQ(zrnStaticCreate(f, info, sno, &status), kZrnErrSpatialAxis);
+  info.axis.dx[1] = -20.0;
+  ASSERT_EQ(zrnStaticCreate(f, info, sno, &status), kZrnOk);
+  EXPECT_EQ(sno, 1);
+  ASSERT_EQ(zrnFileClose(f), 0);
+
+  ZrnFile r;
+  ASSERT_EQ(zrnFileRead(r, name), 0);
+  ZrnSpatialAxis a;
+  ASSERT_EQ(zrnGetItemDim(r, 1, a), 0);
+  EXPECT_EQ(a.x0[0], 100.0);
+  EXPECT_EQ(a.dx[1], -20.0);
+  int nstatics = 0;
+  zrnGetNoOfStatics(r, nstatics);
+  EXPECT_EQ(nstatics, 1);
   zrnFileClose(r);
 }
 

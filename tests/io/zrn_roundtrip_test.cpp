@@ -7,6 +7,7 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <array>
 #include <cmath>
 #include <vector>
 
@@ -295,6 +296,131 @@ TEST(ZrnRoundTrip, LineAndGridFilesKeepTheirAxesAndLayout) {
       nc_close(ncid);
     }
   }
+}
+
+// Writes a grid file of the axis's kind with one dynamic item over two steps
+// and a static item on the same grid.
+void WriteGridFile(const std::string& name, const ZrnSpatialAxis& a) {
+  ZrnFile w;
+  ASSERT_EQ(zrnHeaderCreate(w, name, kZrnFileData, "grid"), 0);
+  zrnSetEqCalendarAxis(w, kStart, 600.0);
+  zrnSetItemInfo(w, 1, "Depth", kUvqIWaterDepth, kUvqUmeter, kZrnDouble);
+  if (a.type == kZrnAxisD1) { ASSERT_EQ(zrnSetItemAxisEqD1(w, 1, a.n[0], a.x0[0], a.dx[0]), 0); }
+  if (a.type == kZrnAxisD2) {
+    ASSERT_EQ(zrnSetItemAxisEqD2(w, 1, a.n[0], a.n[1], a.x0[0], a.x0[1], a.dx[0], a.dx[1]), 0);
+  }
+  if (a.type == kZrnAxisD3) {
+    ASSERT_EQ(zrnSetItemAxisEqD3(w, 1, a.n[0], a.n[1], a.n[2], a.x0[0], a.x0[1], a.x0[2], a.dx[0],
+                                 a.dx[1], a.dx[2]),
+              0);
+  }
+  ASSERT_EQ(zrnFileCreate(w), 0);
+  ZrnItemInfo bed;
+  bed.name = "Bed level";
+  bed.item_type = kUvqIBathymetry;
+  bed.unit = kUvqUmeter;
+  bed.precision = kZrnDouble;
+  bed.axis = a;
+  int sno = 0;
+  ASSERT_EQ(zrnStaticCreate(w, bed, sno), 0);
+  const auto z = Record(9, 0, a.Count());
+  ASSERT_EQ(zrnStaticWrite(w, sno, z.data(), static_cast<long>(z.size())), 0);
+  WriteSteps(w, 0, 2);
+  ASSERT_EQ(zrnFileClose(w), 0);
+}
+
+void ExpectAxis(const ZrnSpatialAxis& got, const ZrnSpatialAxis& want) {
+  ASSERT_EQ(got.type, want.type);
+  for (int k = 0; k < want.type; ++k) {
+    EXPECT_EQ(got.n[k], want.n[k]) << "dimension " << k;
+    EXPECT_EQ(got.x0[k], want.x0[k]) << "dimension " << k;
+    EXPECT_EQ(got.dx[k], want.dx[k]) << "dimension " << k;
+  }
+}
+
+ZrnSpatialAxis Grid(int type, std::array<int, 3> n, std::array<double, 3> x0,
+                    std::array<double, 3> dx) {
+  ZrnSpatialAxis a;
+  a.type = type;
+  a.n = n;
+  a.x0 = x0;
+  a.dx = dx;
+  return a;
+}
+
+// A single-cell axis has no second coordinate value to give its spacing; a
+// descending axis (rasters from north to south, layers from the top down) has
+// a negative one. Both come back exactly, for dynamic and static items.
+TEST(ZrnRoundTrip, SingleCellAndDescendingAxesKeepTheirSpacing) {
+  test::TempDir dir;
+  const struct {
+    const char* file;
+    ZrnSpatialAxis axis;
+  } cases[] = {
+      {"point_line.zrn1", Grid(kZrnAxisD1, {1, 1, 1}, {500.0, 0, 0}, {25.0, 1, 1})},
+      {"column.zrn2", Grid(kZrnAxisD2, {1, 3, 1}, {100.0, 200.0, 0}, {10.0, 20.0, 1})},
+      {"row.zrn2", Grid(kZrnAxisD2, {3, 1, 1}, {100.0, 200.0, 0}, {10.0, 20.0, 1})},
+      {"one_layer.zrn3", Grid(kZrnAxisD3, {3, 2, 1}, {100.0, 200.0, -5.0}, {10.0, 20.0, 2.5})},
+      {"one_cell.zrn3", Grid(kZrnAxisD3, {1, 1, 1}, {0.5, 0.25, -3.0}, {0.1, 0.2, 0.3})},
+      {"north_south.zrn2", Grid(kZrnAxisD2, {3, 4, 1}, {100.0, 260.0, 0}, {10.0, -20.0, 1})},
+      {"top_down.zrn3", Grid(kZrnAxisD3, {2, 2, 3}, {7.0e5, 6.1e6, -0.5}, {0.1, -0.1, -1.5})},
+  };
+  for (const auto& c : cases) {
+    SCOPED_TRACE(c.file);
+    const std::string name = dir.file(c.file);
+    WriteGridFile(name, c.axis);
+    ZrnFile r;
+    ASSERT_EQ(zrnFileRead(r, name), 0);
+    ZrnSpatialAxis a;
+    ASSERT_EQ(zrnGetItemDim(r, 1, a), 0);
+    ExpectAxis(a, c.axis);
+    ZrnItemInfo info;
+    ASSERT_EQ(zrnStaticRead(r, info), 0);
+    ExpectAxis(info.axis, c.axis);
+    std::vector<double> z(static_cast<size_t>(info.axis.Count()));
+    ASSERT_EQ(zrnStaticGetData(r, z.data(), static_cast<long>(z.size())), 0);
+    EXPECT_EQ(z, Record(9, 0, info.axis.Count()));
+    ExpectSteps(r, 2);
+    zrnFileClose(r);
+  }
+
+  // The coordinate values of a descending axis descend (what other readers
+  // see), and the axis is kept as numbers, never as strings.
+  int ncid, yv;
+  ASSERT_EQ(nc_open(dir.file("north_south.zrn2").c_str(), NC_NOWRITE, &ncid), NC_NOERR);
+  ASSERT_EQ(nc_inq_varid(ncid, "y", &yv), NC_NOERR);
+  double ys[4];
+  ASSERT_EQ(nc_get_var_double(ncid, yv, ys), NC_NOERR);
+  EXPECT_EQ(ys[0], 260.0);
+  EXPECT_EQ(ys[3], 200.0);
+  nc_type type;
+  size_t len;
+  for (const char* att : {"zrn_axis_origin", "zrn_axis_spacing"}) {
+    ASSERT_EQ(nc_inq_att(ncid, yv, att, &type, &len), NC_NOERR) << att;
+    EXPECT_EQ(type, NC_DOUBLE);
+    EXPECT_EQ(len, 1u);
+  }
+  nc_close(ncid);
+}
+
+// Another tool that reverses or cuts an axis rewrites the coordinate values
+// but carries our attributes over unchanged: the values win.
+TEST(ZrnRoundTrip, CoordinateValuesChangedByAnotherToolWinOverTheStoredAxis) {
+  test::TempDir dir;
+  const std::string name = dir.file("edited.zrn2");
+  WriteGridFile(name, Grid(kZrnAxisD2, {4, 2, 1}, {100.0, 200.0, 0}, {10.0, 20.0, 1}));
+  int ncid, xv;
+  ASSERT_EQ(nc_open(name.c_str(), NC_WRITE, &ncid), NC_NOERR);
+  ASSERT_EQ(nc_inq_varid(ncid, "x", &xv), NC_NOERR);
+  const double reversed[4] = {130.0, 120.0, 110.0, 100.0};
+  ASSERT_EQ(nc_put_var_double(ncid, xv, reversed), NC_NOERR);
+  ASSERT_EQ(nc_close(ncid), NC_NOERR);
+  ZrnFile r;
+  ASSERT_EQ(zrnFileRead(r, name), 0);
+  ZrnSpatialAxis a;
+  ASSERT_EQ(zrnGetItemDim(r, 1, a), 0);
+  ExpectAxis(a, Grid(kZrnAxisD2, {4, 2, 1}, {130.0, 200.0, 0}, {-10.0, 20.0, 1}));
+  zrnFileClose(r);
 }
 
 // Two triangles and a quadrilateral:  4---5---6

@@ -67,9 +67,9 @@ void WriteAscendingGrid(const std::string& path, const GridFile& g, const std::v
   ASSERT_EQ(zrnFileClose(f), 0);
 }
 
-// The data-file layer writes ascending axes only; an axis that descends, as
-// other tools write them (rasters from north to south, depths downward), is put
-// into the file's coordinate variable afterwards.
+// A grid with descending axes as other tools write them (rasters from north to
+// south, depths downward): the file is written ascending and its coordinate
+// values are then reversed behind the layer's back, as such a tool leaves them.
 void WriteGrid(const std::string& path, const GridFile& g, const std::vector<double>& values) {
   GridFile ascending = g;
   for (double& d : ascending.dx) d = std::abs(d);
