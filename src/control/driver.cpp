@@ -109,7 +109,9 @@ int RunVantorHD(int argc, char** argv) {
   CloseLogFile();
   if (run.process_id >= 1 && run.delete_logfile >= 1) std::remove(run.log_file.c_str());
   EndMessagePassing(run);
-  kwoExit(0);
+  // A run ended by a module's failure (negative run status) must not look
+  // like a success to the caller.
+  kwoExit(run.run_status < 0 ? 1 : 0);
 }
 
 }  // namespace vhd
