@@ -187,7 +187,10 @@ void CorrectRadiationStressHD(HdModule& hd, const Mesh& mesh, BoundaryCondition&
 // mass flux and the momentum slots of the inner element in the solver's face
 // arrays, and the face flux of the state. Called from the boundary-face loop
 // for every face of an open code, whatever the wet/dry code of its element.
-void BoundaryFaceFluxHD(HdModule& hd, HdSolver& solver, const Mesh& mesh, const BoundaryFaceRecord& record);
+// theta (0..1] multiplies the face's flux (mass and momentum, not the bed
+// slope) when the outflow of the inner element is limited.
+void BoundaryFaceFluxHD(HdModule& hd, HdSolver& solver, const Mesh& mesh, const BoundaryFaceRecord& record,
+                        double theta = 1.0);
 
 // Positive root c of 2 c^3 - R c^2 - g q = 0 joining a discharge per width q
 // (positive into the domain) with the outgoing characteristic R = u_n + 2c:

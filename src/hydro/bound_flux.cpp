@@ -37,9 +37,10 @@ RiemannSide MakeSide(const HdState& st, int e, double d, double h, double k, dou
   s.h = h;
   s.d = d;
   s.hp = h + k;
-  s.P = st.P[e];
-  s.Q = st.Q[e];
+  // Only a side with a velocity moves water (P = Q = 0 otherwise).
   if (s.wet == 1 && h >= h_min && h > 0) {
+    s.P = st.P[e];
+    s.Q = st.Q[e];
     s.u = s.P / h;
     s.v = s.Q / h;
   }
@@ -84,8 +85,18 @@ RiemannFlux DirectFlux(double hb, double unb, double utb, double d, double k, do
   return F;
 }
 
-void WriteFace(HdState& st, HdSolver& s, int f, const RiemannFlux& F, bool wet, double bedslope, double nx,
-               double ny) {
+// Face slots of the inner element. bedslope is g X d len with the face d of
+// the flux (F.d), so that pressure and bed slope cancel for water at rest.
+// theta (0..1] multiplies the flux when the outflow of the inner element is
+// limited.
+void WriteFace(HdState& st, HdSolver& s, int f, RiemannFlux F, bool wet, double bedslope, double nx, double ny,
+               double theta) {
+  if (theta < 1.0) {
+    F.Fh *= theta;
+    F.mass *= theta;
+    F.momx *= theta;
+    F.momy *= theta;
+  }
   s.f_mass[f] = F.mass;
   st.face_flux[f] = F.Fh;
   st.face_flux_len[f] = F.mass;
@@ -106,7 +117,7 @@ void ZeroFace(HdState& st, HdSolver& s, int f) {
 // behind the partner face, both seen over the mean of their still water
 // depths; a wet element facing a dry partner meets a wall.
 void CyclicFace(HdModule& hd, HdSolver& s, const Mesh& mesh, const BoundaryFaceRecord& rec,
-                const BoundaryFaceCondition& fc) {
+                const BoundaryFaceCondition& fc, double theta) {
   HdState& st = hd.state;
   const int f = rec.face, c = rec.element;
   const int p = static_cast<int>(OldValue(fc, 1));
@@ -149,7 +160,7 @@ void CyclicFace(HdModule& hd, HdSolver& s, const Mesh& mesh, const BoundaryFaceR
   const HdSolutionTechnique& sol = hd.solution;
   const RiemannFlux F =
       RiemannFaceFlux(L, R, nx, ny, h_min, sol.type_of_Riemann_solver, sol.type_of_entropy_fix, len, g);
-  WriteFace(st, s, f, F, cc == kWet, g * (st.eta[c] + kc) * dm * len, nx, ny);
+  WriteFace(st, s, f, F, cc == kWet, g * (st.eta[c] + kc) * F.d * len, nx, ny, theta);
 }
 
 }  // namespace
@@ -174,11 +185,12 @@ double DischargeCelerity(double q, double R, double g) {
   return std::max(c, c_min);
 }
 
-void BoundaryFaceFluxHD(HdModule& hd, HdSolver& s, const Mesh& mesh, const BoundaryFaceRecord& rec) {
+void BoundaryFaceFluxHD(HdModule& hd, HdSolver& s, const Mesh& mesh, const BoundaryFaceRecord& rec,
+                        double theta) {
   HdState& st = hd.state;
   const BoundaryFaceCondition& fc = hd.boundary.faces[hd.boundary.face_condition[rec.face]];
   if (fc.type == kBcCyclic) {
-    CyclicFace(hd, s, mesh, rec, fc);
+    CyclicFace(hd, s, mesh, rec, fc, theta);
     return;
   }
   const int f = rec.face, c = rec.element;
@@ -284,7 +296,7 @@ void BoundaryFaceFluxHD(HdModule& hd, HdSolver& s, const Mesh& mesh, const Bound
       F.mass = F.Fh * len;
     }
   }
-  WriteFace(st, s, f, F, wet, g * (st.eta[c] + k) * df * len, nx, ny);
+  WriteFace(st, s, f, F, wet, g * (st.eta[c] + k) * F.d * len, nx, ny, theta);
 }
 
 }  // namespace vhd

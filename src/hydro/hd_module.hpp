@@ -346,6 +346,15 @@ void SetupInitialConditionsHD(HdModule& hd);
 // levels, element lengths).
 void AllocateStateHD(HdModule& hd, const Mesh& mesh);
 
+// Element length of the CFL rate (m): L = 4 A / P, A the area and P the
+// perimeter (the sum of the face lengths). For water at rest the rate
+// 2 sqrt(g h) / L then gives dt sqrt(g h) = CFL 2 A / P, the bound under
+// which the first-order update of an element is a convex combination of its
+// own and its neighbours' states; on a square it is the edge. The shortest
+// edge overestimates the admissible step on thin triangles (whose height is
+// far below their shortest edge), where runs at CFL 0.8 blew up.
+double CflLengthHD(const Mesh& mesh, int e);
+
 // Initial state from the initial conditions, ending with the initial
 // flood/dry codes; afterwards h = eta + d >= 0 in every element and the
 // blow-up elevation limit is set.

@@ -131,6 +131,13 @@ void SetupSpaceHD(HdModule& hd, const std::vector<const Mesh*>& meshes) {
   }
 }
 
+double CflLengthHD(const Mesh& mesh, int e) {
+  const ElementTable& el = mesh.elements;
+  double perimeter = 0.0;
+  for (int j = 1; j <= ElementFaceCount(el, e); ++j) perimeter += mesh.faces.length[ElementFace(el, e, j)];
+  return perimeter > 0.0 ? 4.0 * el.area[e] / perimeter : el.length[e];
+}
+
 void AllocateStateHD(HdModule& hd, const Mesh& mesh) {
   HdState& s = hd.state;
   const ElementTable& el = mesh.elements;
@@ -156,7 +163,7 @@ void AllocateStateHD(HdModule& hd, const Mesh& mesh) {
   const bool has_metric = el.cos_lat.size() >= ne && el.tan_lat.size() >= ne;
   for (int e = 1; e <= ne; ++e) {
     s.d[e] = -el.zc[e];
-    s.length[e] = el.length[e];
+    s.length[e] = CflLengthHD(mesh, e);
     s.cos_lat[e] = hd.projection == 2 && has_metric ? el.cos_lat[e] : 1.0;
     s.tan_lat[e] = hd.projection == 2 && has_metric ? el.tan_lat[e] : 0.0;
     s.eta[e] = 0.0;

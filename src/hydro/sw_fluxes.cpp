@@ -72,6 +72,40 @@ void EddyFlux(double nu, double hf, double ux, double uy, double vx, double vy, 
   Dy = hf * nu * (shear * nx + 2.0 * vy * ny) * len;
 }
 
+// Velocity (m/s) with which water leaving element e carries momentum: its
+// centre velocity when it is wet and at least h_min deep, else 0 (flooded
+// and shallow elements count as at rest, as in the fluxes).
+inline void CarriedVelocity(const int* code, const double* h, const double* P, const double* Q, double h_min,
+                            int e, double& u, double& v) {
+  u = v = 0.0;
+  if (code[e] == kWet && h[e] >= h_min && h[e] > 0) {
+    const double inv = 1.0 / h[e];
+    u = P[e] * inv;
+    v = Q[e] * inv;
+  }
+}
+
+// Bounds the face velocity of a side componentwise by umax, vmax; the
+// fluxes follow the velocity.
+inline void BoundVelocity(RiemannSide& side, double umax, double vmax) {
+  if (std::abs(side.u) > umax) {
+    side.u = std::copysign(umax, side.u);
+    side.P = side.u * side.h;
+  }
+  if (std::abs(side.v) > vmax) {
+    side.v = std::copysign(vmax, side.v);
+    side.Q = side.v * side.h;
+  }
+}
+
+// The face flux of an element whose outflow is limited (factor theta < 1).
+inline void ScaleFlux(RiemannFlux& F, double theta) {
+  F.Fh *= theta;
+  F.mass *= theta;
+  F.momx *= theta;
+  F.momy *= theta;
+}
+
 void ZeroFace(HdSolver& s, int f) {
   s.f_mass[f] = s.f_mx1[f] = s.f_my1[f] = s.f_mx2[f] = s.f_my2[f] = 0.0;
 }
@@ -80,8 +114,8 @@ void ZeroFace(HdSolver& s, int f) {
 // contributions of each side. Every input of the face is read once; faces
 // without a wet side return before any arithmetic.
 template <bool kSecond>
-inline void InteriorFace(const FaceLoopInput& in, HdSolver& s, double* face_flux, double* face_flux_len,
-                         int f) {
+inline void InteriorFace(const FaceLoopInput& in, HdSolver& s, double* face_flux, double* face_flux_len, int f,
+                         double theta = 1.0) {
   const int L = in.e1[f], R = in.e2[f];
   const int cL = in.code[L], cR = in.code[R];
   if (cL != kWet && cR != kWet) {  // dry-dry (or flooded) faces carry nothing
@@ -141,34 +175,54 @@ inline void InteriorFace(const FaceLoopInput& in, HdSolver& s, double* face_flux
   }
   // Face d and face depths from d_f, except with face_average_d 0 and at the
   // faces of a second-order run that fell back to first order, where each
-  // side keeps its centre d and h.
-  if (in.fad != 0 && (!first || !kSecond)) {
+  // side keeps its centre d and h. The type-4 solver keeps d_f at those faces
+  // too: its contact speed u* = (u_L + u_R)/2 + c_L - c_R would move water at
+  // rest whose two sides see different depths.
+  if (in.fad != 0 && (!first || !kSecond || in.solver == 4)) {
     FaceDepth(l, df);
     FaceDepth(r, df);
   }
   const double kL = in.k[L], kR = in.k[R];
   const double g = in.g;
-  // Bed-slope factors g X d_f |n| len of the two sides (X = eta + k at the centre).
-  const double bL = g * (etaL + kL) * df * nlen;
-  const double bR = g * (etaR + kR) * df * nlen;
   double Dx = 0.0, Dy = 0.0;
 
   if (riemann) {
+    // A side moves water only where it has a velocity: a side that is not
+    // wet or shallower than h_min passes P = Q = 0 with u = v = 0 (its
+    // momentum, e.g. what a flooded element gathers, would otherwise push
+    // water out of it that carries no momentum).
     RiemannSide sl, sr;
     sl.wet = cL == kWet ? 1 : 0;
-    sl.h = l.h, sl.d = l.d, sl.hp = l.h + kL, sl.P = l.P, sl.Q = l.Q;
+    sl.h = l.h, sl.d = l.d, sl.hp = l.h + kL;
     if (cL == kWet && l.h >= in.h_min && l.h > 0) {
       const double inv = 1.0 / l.h;
+      sl.P = l.P, sl.Q = l.Q;
       sl.u = l.P * inv, sl.v = l.Q * inv;
     }
     sr.wet = cR == kWet ? 1 : 0;
-    sr.h = r.h, sr.d = r.d, sr.hp = r.h + kR, sr.P = r.P, sr.Q = r.Q;
+    sr.h = r.h, sr.d = r.d, sr.hp = r.h + kR;
     if (cR == kWet && r.h >= in.h_min && r.h > 0) {
       const double inv = 1.0 / r.h;
+      sr.P = r.P, sr.Q = r.Q;
       sr.u = r.P * inv, sr.v = r.Q * inv;
     }
-    const RiemannFlux F =
+    if constexpr (kSecond) {
+      // P and eta are reconstructed apart, so where the face depth is small
+      // P / h can be far larger than any velocity of the two elements. Each
+      // velocity component at the face is bounded by the larger magnitude of
+      // that component at the two centres (P follows), which leaves smooth
+      // flow alone and keeps thin water from being flung out.
+      if (!first) {
+        double uL, vL, uR, vR;
+        CarriedVelocity(in.code, in.h, in.P, in.Q, in.h_min, L, uL, vL);
+        CarriedVelocity(in.code, in.h, in.P, in.Q, in.h_min, R, uR, vR);
+        BoundVelocity(sl, std::max(std::abs(uL), std::abs(uR)), std::max(std::abs(vL), std::abs(vR)));
+        BoundVelocity(sr, std::max(std::abs(uL), std::abs(uR)), std::max(std::abs(vL), std::abs(vR)));
+      }
+    }
+    RiemannFlux F =
         RiemannFaceFluxUnit(sl, sr, ex, ey, nn, in.h_min, in.solver, in.entropy_fix, in.len[f], g, in.sqrt_g);
+    if (theta < 1.0) ScaleFlux(F, theta);
     if (in.eddy) {
       EddyFlux(0.5 * (in.nu[L] + in.nu[R]), 0.5 * (hL + hR), 0.5 * (in.ux[L] + in.ux[R]),
                0.5 * (in.uy[L] + in.uy[R]), 0.5 * (in.vx[L] + in.vx[R]), 0.5 * (in.vy[L] + in.vy[R]), ex, ey,
@@ -178,15 +232,33 @@ inline void InteriorFace(const FaceLoopInput& in, HdSolver& s, double* face_flux
     s.f_mass[f] = F.mass;
     face_flux[f] = F.Fh;
     face_flux_len[f] = F.mass;
+    // Bed-slope terms g X d |n| len of the wet sides (X = eta + k at the
+    // centre) with the face d that the flux's pressure saw, so that pressure
+    // and bed slope cancel for water at rest at any level. A flooded side
+    // (mass only) receives the momentum that the water flowing in from the
+    // wet side carries, which that side loses with its momentum flux.
+    const double bd = g * F.d * nlen;
     if (cL == kWet) {
+      const double bL = (etaL + kL) * bd;
       s.f_mx1[f] = -fx + bL * ex;
       s.f_my1[f] = -fy + bL * ey;
+    } else if (F.mass < 0) {
+      double u, v;
+      CarriedVelocity(in.code, in.h, in.P, in.Q, in.h_min, R, u, v);
+      s.f_mx1[f] = -F.mass * u;
+      s.f_my1[f] = -F.mass * v;
     } else {
       s.f_mx1[f] = s.f_my1[f] = 0.0;
     }
     if (cR == kWet) {
+      const double bR = (etaR + kR) * bd;
       s.f_mx2[f] = fx - bR * ex;
       s.f_my2[f] = fy - bR * ey;
+    } else if (F.mass > 0) {
+      double u, v;
+      CarriedVelocity(in.code, in.h, in.P, in.Q, in.h_min, L, u, v);
+      s.f_mx2[f] = F.mass * u;
+      s.f_my2[f] = F.mass * v;
     } else {
       s.f_mx2[f] = s.f_my2[f] = 0.0;
     }
@@ -194,7 +266,8 @@ inline void InteriorFace(const FaceLoopInput& in, HdSolver& s, double* face_flux
   }
 
   // Land treatment of the wet side: no mass flux, the wall pressure and the
-  // bed-slope term.
+  // bed-slope term, both with the side's own face d (at rest the wall depth
+  // is the side's face depth, and the two cancel at any level).
   s.f_mass[f] = 0.0;
   face_flux[f] = face_flux_len[f] = 0.0;
   if (cL == kWet) {
@@ -202,6 +275,7 @@ inline void InteriorFace(const FaceLoopInput& in, HdSolver& s, double* face_flux
     const double un = (hs >= in.h_min && hs > 0) ? (l.P * ex + l.Q * ey) * nn / hs : 0.0;
     const double hw = WallDepth(in.land_condition, un, hs, kL, g);
     const double pw = 0.5 * g * (hw * hw - l.d * l.d) * nlen;
+    const double bL = g * (etaL + kL) * l.d * nlen;
     if (in.eddy) EddyFlux(in.nu[L], hs, in.ux[L], in.uy[L], in.vx[L], in.vy[L], ex, ey, nlen, Dx, Dy);
     s.f_mx1[f] = -(pw * ex - Dx) + bL * ex;
     s.f_my1[f] = -(pw * ey - Dy) + bL * ey;
@@ -211,6 +285,7 @@ inline void InteriorFace(const FaceLoopInput& in, HdSolver& s, double* face_flux
     const double un = (hs >= in.h_min && hs > 0) ? -(r.P * ex + r.Q * ey) * nn / hs : 0.0;
     const double hw = WallDepth(in.land_condition, un, hs, kR, g);
     const double pw = 0.5 * g * (hw * hw - r.d * r.d) * nlen;
+    const double bR = g * (etaR + kR) * r.d * nlen;
     if (in.eddy) EddyFlux(in.nu[R], hs, in.ux[R], in.uy[R], in.vx[R], in.vy[R], ex, ey, nlen, Dx, Dy);
     s.f_mx2[f] = (pw * ex - Dx) - bR * ex;
     s.f_my2[f] = (pw * ey - Dy) - bR * ey;
@@ -320,6 +395,77 @@ inline void ElementSums(const HdSolver& s, const int* start, const int* codes, i
   }
 }
 
+// Outflow limiter of a stage. The stage advances h from the base depth h_b
+// of the step with the fluxes of the stage state, so with a second-order
+// reconstruction or two stages (or a step at dt_min) an element can be sent
+// out more water than it holds. An element with outflow O (m3/s, the sum of
+// its outgoing face mass fluxes) and held volume V = A max(0, h_b + dt s_h)
+// below dt O gets the factor theta = V / (dt O); every face multiplies its
+// flux (mass and momentum, not the bed slope and not the eddy stress) by the
+// factor of its upwind element. Both sides of a face see the same flux, so
+// mass and momentum stay conserved; incoming fluxes are not counted, so the
+// new depth is never negative. Water at rest has no mass flux and is never
+// touched.
+// Returns the number of limited elements.
+int OutflowFactorsHD(HdModule& hd, HdSolver& s, const Mesh& mesh, int ne, bool first_stage, double dt) {
+  const HdState& st = hd.state;
+  const int* start = s.element_face_start.data();
+  const int* codes = s.element_face_code.data();
+  const double* mass = s.f_mass.data();
+  const double* area = mesh.elements.area.data();
+  const double* hbase = first_stage ? st.h.data() : st.h_old.data();
+  double* factor = s.outflow_factor.data();
+  int nlimited = 0;
+  VHD_OMP_PARALLEL_FOR_REDUCTION(+, nlimited)
+  for (int e = 1; e <= ne; ++e) {
+    double out = 0.0;
+    for (int k = start[e]; k < start[e + 1]; ++k) {
+      const double m = (codes[k] & 1) ? -mass[codes[k] >> 1] : mass[codes[k] >> 1];
+      if (m > 0) out += m;
+    }
+    double theta = 1.0;
+    const double held = std::max(0.0, hbase[e] + dt * s.src_h[e]) * area[e];
+    if (dt * out > held) {
+      theta = held / (dt * out);
+      ++nlimited;
+    }
+    factor[e] = theta;
+  }
+  return nlimited;
+}
+
+// Faces whose upwind element is limited: the face terms formed again (from
+// the same state, so with the same bits) with the flux scaled.
+void LimitOutflowHD(HdModule& hd, HdSolver& s, const Mesh& mesh, const FaceLoopInput& in) {
+  HdState& st = hd.state;
+  double* face_flux = st.face_flux.data();
+  double* face_flux_len = st.face_flux_len.data();
+  const double* factor = s.outflow_factor.data();
+  const int ni = s.interior_faces.size(), nb = s.boundary_faces.size();
+  VHD_OMP_PARALLEL {
+    VHD_OMP_FOR_NOWAIT
+    for (int i = 1; i <= ni; ++i) {
+      const int f = s.interior_faces[i];
+      const double m = s.f_mass[f];
+      if (m == 0) continue;
+      const double theta = factor[m > 0 ? in.e1[f] : in.e2[f]];
+      if (theta >= 1.0) continue;
+      if (in.second) {
+        InteriorFace<true>(in, s, face_flux, face_flux_len, f, theta);
+      } else {
+        InteriorFace<false>(in, s, face_flux, face_flux_len, f, theta);
+      }
+    }
+    VHD_OMP_FOR_NOWAIT
+    for (int i = 1; i <= nb; ++i) {
+      const BoundaryFaceRecord& rec = s.boundary_faces[i];
+      if (rec.kind == kBoundaryLand || !(s.f_mass[rec.face] > 0)) continue;
+      const double theta = factor[rec.element];
+      if (theta < 1.0) BoundaryFaceFluxHD(hd, s, mesh, rec, theta);
+    }
+  }
+}
+
 }  // namespace
 
 void SetupSolverHD(HdModule& hd, const Mesh& mesh, HdSolver& s) {
@@ -404,6 +550,7 @@ void SetupSolverHD(HdModule& hd, const Mesh& mesh, HdSolver& s) {
   s.f_mx2.assign(nf);
   s.f_my2.assign(nf);
   for (Array1<double>* a : {&s.src_h, &s.src_P, &s.src_Q, &s.depth_correction}) a->assign(ne, 0.0);
+  s.outflow_factor.assign(ne, 1.0);
   if (second) {
     for (Array1<double>* a : {&s.eta_x, &s.eta_y, &s.P_x, &s.P_y, &s.Q_x, &s.Q_y}) a->assign(ne, 0.0);
   }
@@ -439,7 +586,7 @@ void BoundaryFaceTerms(const HdModule& hd, HdSolver& s, const Mesh& mesh, const 
       if (hd.eddy.horizontal.type > 0) {
         EddyFlux(st.nu_t[c], hs, st.ux[c], st.uy[c], st.vx[c], st.vy[c], nx, ny, len, Dx, Dy);
       }
-      const double b = g * (st.eta[c] + k) * df * len;
+      const double b = g * (st.eta[c] + k) * ds * len;
       s.f_mass[f] = 0.0;
       s.f_mx1[f] = -(pw * nx - Dx) + b * nx;
       s.f_my1[f] = -(pw * ny - Dy) + b * ny;
@@ -489,8 +636,9 @@ void CALCDERIVATIVESW2D(HdModule& hd, HdSolver& s, const Mesh& mesh, int stage, 
   const int damping = s.shallow_depth_option;
   const bool iterate_drag = hd.solution.bed_resistance_discretization == 2;
   constexpr double half_pi = 0.5 * std::numbers::pi;
+  VHD_OMP_PARALLEL { FaceTerms(hd, s, mesh, in); }
+  if (OutflowFactorsHD(hd, s, mesh, ne, first_stage, dt) > 0) LimitOutflowHD(hd, s, mesh, in);
   VHD_OMP_PARALLEL {
-    FaceTerms(hd, s, mesh, in);
     VHD_OMP_FOR
     for (int e = 1; e <= ne; ++e) {
       double sh, sP, sQ;

@@ -27,9 +27,29 @@
 // Settings interpreted here where the product leaves them open:
 //   - face_value_limiter > 0 clips each reconstructed face value of eta, P, Q
 //     to the range of the two element-centre values across the face;
+//   - with second order, each face velocity component is bounded by the
+//     larger magnitude of that component at the two centres (P and eta are
+//     reconstructed apart, and over thin water P / h could otherwise exceed
+//     every velocity around); a side that is not wet or shallower than h_min
+//     passes P = Q = 0 with its zero velocity;
 //   - the element depth correction k is zero (no depth correction is active);
-//   - the bed-slope term is g X d_f n len for both components (the extra
-//     g X^2/2 n_y len of the y form sums to zero over a closed element);
+//   - the bed-slope term is g X d n len for both components (the extra
+//     g X^2/2 n_y len of the y form sums to zero over a closed element),
+//     with d the face d that the pressure of the face saw: the flux's own
+//     face d (RiemannFlux::d; d_f when both sides pass d_f) at Riemann
+//     faces, the side's face d at walls. With d_f at every face, as the
+//     product states it, pressure and bed slope cancel only for a surface at
+//     datum: where a side passes another d (its centre d with
+//     face_average_d 0, or d clipped to the surface where the surface lies
+//     below the face bed) a lake at rest at another level would start to
+//     move;
+//   - a flooded element (mass only) gains, at a face to a wet element, the
+//     momentum that the water flowing in carries (the mass flux times the
+//     wet element's centre velocity), which the wet element loses with its
+//     momentum flux; otherwise the momentum carried into a flooding element
+//     would be lost and dry-bed fronts would lag;
+//   - the stage is limited so that no element loses more water than it holds
+//     (outflow limiter, in CALCDERIVATIVESW2D);
 //   - CALCVELOCITYFILTER2D blends: u_new = (1 - c) u + c u_mean with
 //     c = filtering_coefficient and u_mean the area-weighted mean of the
 //     element and its qualifying face neighbours.
@@ -83,6 +103,9 @@ struct HdSolver {
   // Element source terms of the stage, filled by forcings and sources: depth
   // (m/s) for every element, momentum (m2/s2) for wet elements.
   Array1<double> src_h, src_P, src_Q;
+  // Per element: the factor (0..1] of its outgoing mass fluxes in the
+  // current stage (outflow limiter, see CALCDERIVATIVESW2D).
+  Array1<double> outflow_factor;
   // Element depth correction k (m), zero in ordinary runs.
   Array1<double> depth_correction;
   // Weight of the velocity filter (element area, m2), and scratch for it

@@ -120,8 +120,9 @@ void CHECKTIMESTEPHD(HdModule& hd, const Mesh& mesh, double dt) {
 }
 
 void ReportCflViolations(std::string_view title, const Mesh& mesh, const Array1<double>& cfl,
-                         const Array1<int>& code, const Array1<double>* still_depth, double t, double dt,
-                         long long& count, int maximum, int error_level) {
+                         const Array1<int>& code, const Array1<double>* still_depth,
+                         const Array1<double>& length, double t, double dt, long long& count, int maximum,
+                         int error_level) {
   const int ne = mesh.elements.nelements_int > 0 ? mesh.elements.nelements_int : mesh.elements.nelements;
   const bool geographic = IsGeographic(mesh.projection);
   const double scale = geographic ? kRadToDeg : 1.0;
@@ -139,7 +140,7 @@ void ReportCflViolations(std::string_view title, const Mesh& mesh, const Array1<
       WriteValueLine("x-coordinate (center) : %", mesh.elements.xc[e] * scale);
       WriteValueLine("y-coordinate (center) : %", mesh.elements.yc[e] * scale);
       if (still_depth) WriteValueLine("still water depth     : %", (*still_depth)[e]);
-      WriteValueLine("length                : %", mesh.elements.length[e]);
+      WriteValueLine("length                : %", length[e]);
     }
     if (count == maximum) Warning("Number of CFL condition violations is larger than 200");
   }
@@ -180,7 +181,7 @@ void StepHD(HdModule& hd, HdSolver& solver, const Mesh& mesh, double t, double d
     if (cfl > 1.00001 && st.wetdry[e] == kWet) violated = 1;
   }
   if (violated) {
-    ReportCflViolations("CFL condition violated in HD calculation", mesh, st.cfl, st.wetdry, &st.d, t, dt,
+    ReportCflViolations("CFL condition violated in HD calculation", mesh, st.cfl, st.wetdry, &st.d, st.length, t, dt,
                         hd.n_cfl_violations, hd.time_step.maximum_number_of_errors, hd.time_step.error_level);
   }
   const double t_new = t + dt;

@@ -55,11 +55,13 @@ void CHECKTIMESTEPHD(HdModule& hd, const Mesh& mesh, double dt);
 // increments count; while count <= maximum a warning block names the
 // element; the line on the maximum is written once, when count reaches it.
 // error_level 1 stops the run once count exceeds maximum, 2 at the first
-// violation. still_depth may be null (no depth line). title is the block's
+// violation. still_depth may be null (no depth line); length is the element
+// length of the rate (the "length" line). title is the block's
 // first line ("CFL condition violated in HD calculation").
 void ReportCflViolations(std::string_view title, const Mesh& mesh, const Array1<double>& cfl,
-                         const Array1<int>& code, const Array1<double>* still_depth, double t, double dt,
-                         long long& count, int maximum, int error_level);
+                         const Array1<int>& code, const Array1<double>* still_depth,
+                         const Array1<double>& length, double t, double dt, long long& count, int maximum,
+                         int error_level);
 
 // Initial step: velocities from the fluxes, face fluxes zeroed, derivatives
 // of the initial state.

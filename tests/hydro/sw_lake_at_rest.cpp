@@ -17,7 +17,7 @@ double Bed(double x, double y) {
   return -0.5 + 0.8 * std::exp(-r2 / 0.03);
 }
 
-void MakeLake(SwCase& c, int solver, int order) {
+void MakeLake(SwCase& c, int solver, int order, double level) {
   RectangleMeshSpec spec;
   spec.nx = spec.ny = 20;
   spec.layout = CellLayout::kRandomTriangles;
@@ -31,15 +31,23 @@ void MakeLake(SwCase& c, int solver, int order) {
   if (solver == 4) c.hd.solution.face_average_d = 1;
   SetFloodDry(c.hd, 0.005, 0.05, 0.1);
   c.hd.bed.type = kBedNone;
-  StartCase(c, [](double, double) { return 0.0; });
+  StartCase(c, [level](double, double) { return level; });
 }
 
+// At datum every pressure and bed-slope term vanishes on its own; at another
+// level they must cancel, at wet-wet faces and at the walls against dry
+// elements alike (also where the surface lies below a face's bed).
 TEST(SwLakeAtRest, EmergedBumpStaysAtRestForEverySolver) {
+  for (double level : {0.0, 0.13, -0.07}) {
   for (int order : {1, 2}) {
     for (int solver = 0; solver <= 4; ++solver) {
-      SCOPED_TRACE(testing::Message() << "solver " << solver << " order " << order);
+      // The central flux has no dissipation: under forward Euler it
+      // amplifies the round-off of the balance, which is exactly zero only
+      // at datum.
+      if (solver == 0 && level != 0.0) continue;
+      SCOPED_TRACE(testing::Message() << "level " << level << " solver " << solver << " order " << order);
       SwCase c;
-      MakeLake(c, solver, order);
+      MakeLake(c, solver, order, level);
       const HdState& st = c.hd.state;
       int n_dry = 0, n_flooded = 0;
       for (int e = 1; e <= st.nelements; ++e) {
@@ -54,16 +62,17 @@ TEST(SwLakeAtRest, EmergedBumpStaysAtRestForEverySolver) {
       }
       EXPECT_LT(dmax, 1e-13);
       RunTo(c, 8.0);
-      EXPECT_EQ(c.hd.n_steps, 2000);
+      EXPECT_GE(c.hd.n_steps, 2000);
       double umax = 0.0, etamax = 0.0;
       for (int e = 1; e <= st.nelements; ++e) {
         if (st.wetdry[e] == kDry) continue;
         umax = std::max({umax, std::abs(st.u[e]), std::abs(st.v[e])});
-        etamax = std::max(etamax, std::abs(st.eta[e]));
+        etamax = std::max(etamax, std::abs(st.eta[e] - level));
       }
       EXPECT_LT(umax, 1e-10);
       EXPECT_LT(etamax, 1e-10);
     }
+  }
   }
 }
 

@@ -40,10 +40,16 @@ TEST(SwTimeStep, DryDomainTakesTheLargestStepAndCflDrivesTheRest) {
   spec.bed = [](double, double) { return -10.0; };
   MakeCase(w, spec, 30.0);
   w.hd.time_step.CFL_critical_HD = 1.0;
+  w.hd.time_step.dt_min_HD = 1e-4;  // below the CFL step of these elements
   StartCase(w, [](double, double) { return 0.0; });
+  // L = 4 A / P, the element length of the rate.
   double rmax = 0;
-  for (int e = 1; e <= w.hd.state.nelements; ++e)
-    rmax = std::max(rmax, 2 * std::sqrt(9.81 * 10.0) / w.mesh.elements.length[e]);
+  for (int e = 1; e <= w.hd.state.nelements; ++e) {
+    double perimeter = 0;
+    for (int j = 1; j <= ElementFaceCount(w.mesh.elements, e); ++j)
+      perimeter += w.mesh.faces.length[ElementFace(w.mesh.elements, e, j)];
+    rmax = std::max(rmax, 2 * std::sqrt(9.81 * 10.0) * perimeter / (4 * w.mesh.elements.area[e]));
+  }
   const double dt = CALCTIMESTEPHD(w.hd, w.solver, w.mesh, 0.0, 30.0);
   EXPECT_DOUBLE_EQ(dt, 30.0 / (std::floor((30.0 - 30e-6) * rmax) + 1));
   EXPECT_LE(dt * rmax, 1.0);

@@ -50,9 +50,12 @@ struct Result {
   double rel_l1;
   double front_lag;  // exact dry front minus the numerical one (m)
   double dx;
+  double h_max;      // largest depth at the end (m)
+  int status;
 };
 
-Result Run(double hR, int n, int order) {
+// solver 0 picks the default of the case: Roe on the wet bed, HLL on the dry.
+Result RunDamBreak(double hR, int n, int order, int solver = 0) {
   SwCase c;
   RectangleMeshSpec spec;
   const double dx = kLength / n;
@@ -64,22 +67,22 @@ Result Run(double hR, int n, int order) {
   spec.seed = 17;
   spec.bed = [](double, double) { return -0.0; };
   MakeCase(c, spec, 0.05);
-  SetScheme(c.hd, hR <= 0 ? 2 : 1, order);
+  SetScheme(c.hd, solver > 0 ? solver : (hR <= 0 ? 2 : 1), order);
   if (hR <= 0) SetFloodDry(c.hd, 1e-5, 5e-5, 1e-4);
   const DamBreak exact(hR);
   StartCase(c, [&](double x, double) { return x < kDam ? hL : hR; });
   RunTo(c, kTime);
-  EXPECT_EQ(c.run_status, 0);
-  double err = 0, ref = 0, front = 0;
+  double err = 0, ref = 0, front = 0, h_max = 0;
   const HdState& st = c.hd.state;
   for (int e = 1; e <= st.nelements; ++e) {
+    h_max = std::max(h_max, st.h[e]);
     const double x = c.mesh.elements.xc[e], a = c.mesh.elements.area[e];
     const double he = exact.Depth(x, kTime);
     err += std::abs(st.h[e] - he) * a;
     ref += he * a;
     if (st.h[e] > 1e-3) front = std::max(front, x);
   }
-  Result r{err / ref, 0.0, dx};
+  Result r{err / ref, 0.0, dx, h_max, c.run_status};
   if (hR <= 0) {
     // Position where the exact depth falls to 1e-3 m.
     const double xi = 2 * exact.cL - std::sqrt(9 * g * 1e-3);
@@ -93,17 +96,18 @@ void Study(const char* name, double hR, double bar) {
   double e[2][3];
   for (int order : {1, 2}) {
     for (int k = 0; k < 3; ++k) {
-      const Result r = Run(hR, ns[k], order);
+      const Result r = RunDamBreak(hR, ns[k], order);
+      EXPECT_EQ(r.status, 0) << name;
       e[order - 1][k] = r.rel_l1;
       std::printf("%s order %d, %3d elements along: relative L1 %.4f", name, order, ns[k], r.rel_l1);
       if (k > 0) std::printf(", rate %.2f", std::log(e[order - 1][k - 1] / r.rel_l1) / std::log(2.0));
       if (hR <= 0) std::printf(", front lag %.3f m = %.2f elements", r.front_lag, r.front_lag / r.dx);
       std::printf("\n");
-      // The front advances through flooded (mass-only) elements that start
-      // without momentum, so it lags; bound the lag by a quarter of the exact
-      // front's travel 2 c_L t.
+      // The front advances through flooded (mass-only) elements, which take
+      // the momentum of the water flowing in; the front where the depth
+      // reaches 1 mm lags the exact one by a few elements at most.
       if (hR <= 0 && order == 2) {
-        EXPECT_LT(r.front_lag, 0.5 * DamBreak(0).cL * kTime) << name;
+        EXPECT_LT(r.front_lag, 4 * r.dx) << name << " " << ns[k];
       }
       if (k > 0) {
         EXPECT_LT(r.rel_l1, e[order - 1][k - 1]) << name << " order " << order;
@@ -117,7 +121,28 @@ void Study(const char* name, double hR, double bar) {
 // Roe solver on the wet bed, HLL with flooding and drying on the dry bed.
 TEST(ValidDamBreak, StokerWetBed) { Study("Stoker", 0.1, 0.015); }
 
-TEST(ValidDamBreak, RitterDryBed) { Study("Ritter", 0.0, 0.02); }
+TEST(ValidDamBreak, RitterDryBed) { Study("Ritter", 0.0, 0.015); }
+
+// Second order with two stages on the dry bed with every upwind solver: the
+// run stays sound, the depth stays within the range of the initial state
+// (the exact solution never exceeds h_L; no water piles up where thin
+// elements flip between wet and dry). Roe, HLL and HLLC keep the error of a
+// sound scheme; the type-4 solver (contact at the two-rarefaction speed) is
+// only held to stay sound: it smears the dry front over more elements.
+TEST(ValidDamBreak, RitterDryBedStaysSoundForEverySolver) {
+  for (int solver : {1, 2, 3, 4}) {
+    for (int n : {50, 100}) {
+      const Result r = RunDamBreak(0.0, n, 2, solver);
+      std::printf("Ritter solver %d order 2, %3d elements along: relative L1 %.4f, largest depth %.4f m\n", solver,
+                  n, r.rel_l1, r.h_max);
+      EXPECT_EQ(r.status, 0) << "solver " << solver << ", " << n;
+      EXPECT_LE(r.h_max, hL * (1 + 1e-9)) << "solver " << solver << ", " << n;
+      if (solver != 4) {
+        EXPECT_LT(r.rel_l1, 0.03) << "solver " << solver << ", " << n;
+      }
+    }
+  }
+}
 
 }  // namespace
 }  // namespace vhd::test
