@@ -3,6 +3,7 @@
 #include "mesh/gradient.hpp"
 
 #include <algorithm>
+#include <array>
 #include <cmath>
 #include <new>
 #include <vector>
@@ -392,27 +393,59 @@ void SetupBoundaryGradient2D(const Mesh& mesh, const Array1<int>& element_flags,
 
 // ---- application ------------------------------------------------------------------------------
 
-void CALCGRADIENTELEMENT2D(const GradientStencil& s, const Array1<double>& phi, Array1<double>& gx,
-                           Array1<double>& gy) {
+namespace {
+
+// The 2D stencil applied to n fields in one pass: each entry's element number
+// and weights are loaded once; per field the sums run over the entries in
+// stencil order, as for one field alone.
+template <int n>
+void ApplyStencil2D(const GradientStencil& s, const std::array<const double*, n> phi,
+                    const std::array<double*, n> gx, const std::array<double*, n> gy) {
   const int* start = s.start.data();
   const int* index = s.index.data();
   const double* wx = s.wx.data();
   const double* wy = s.wy.data();
-  const double* p = phi.data();
-  double* ox = gx.data();
-  double* oy = gy.data();
-  const int n = s.nowned;
+  const int nowned = s.nowned;
   VHD_OMP_PARALLEL_FOR
-  for (int e = 1; e <= n; ++e) {
-    double ax = 0, ay = 0;
+  for (int e = 1; e <= nowned; ++e) {
+    double ax[n], ay[n];
+    for (int i = 0; i < n; ++i) ax[i] = ay[i] = 0.0;
     for (int k = start[e]; k < start[e + 1]; ++k) {
-      const double v = p[index[k]];
-      ax += wx[k] * v;
-      ay += wy[k] * v;
+      const int j = index[k];
+      const double cx = wx[k], cy = wy[k];
+      for (int i = 0; i < n; ++i) {
+        const double v = phi[i][j];
+        ax[i] += cx * v;
+        ay[i] += cy * v;
+      }
     }
-    ox[e] = ax;
-    oy[e] = ay;
+    for (int i = 0; i < n; ++i) {
+      gx[i][e] = ax[i];
+      gy[i][e] = ay[i];
+    }
   }
+}
+
+}  // namespace
+
+void CALCGRADIENTELEMENT2D(const GradientStencil& s, const Array1<double>& phi, Array1<double>& gx,
+                           Array1<double>& gy) {
+  ApplyStencil2D<1>(s, {phi.data()}, {gx.data()}, {gy.data()});
+}
+
+void CALCGRADIENTALLELEMENT2D(const GradientStencil& s, std::span<const GradientField> fields) {
+  detail::ForFieldGroups(static_cast<int>(fields.size()), [&](auto group, int first) {
+    constexpr int n = decltype(group)::value;
+    std::array<const double*, n> phi;
+    std::array<double*, n> gx, gy;
+    for (int i = 0; i < n; ++i) {
+      const GradientField& f = fields[static_cast<std::size_t>(first + i)];
+      phi[i] = f.value->data();
+      gx[i] = f.gx->data();
+      gy[i] = f.gy->data();
+    }
+    ApplyStencil2D<n>(s, phi, gx, gy);
+  });
 }
 
 void CALCGRADIENTELEMENT3D(const GradientStencil& s, const Array1<double>& phi, Array1<double>& gx,
@@ -445,32 +478,7 @@ void CALCGRADIENTELEMENT3D(const GradientStencil& s, const Array1<double>& phi, 
 void CALCGRADIENTVELOCITYELEMENT2D(const GradientStencil& s, const Array1<double>& u, const Array1<double>& v,
                                    Array1<double>& ux, Array1<double>& uy, Array1<double>& vx,
                                    Array1<double>& vy) {
-  const int* start = s.start.data();
-  const int* index = s.index.data();
-  const double* wx = s.wx.data();
-  const double* wy = s.wy.data();
-  const double* pu = u.data();
-  const double* pv = v.data();
-  double* oux = ux.data();
-  double* ouy = uy.data();
-  double* ovx = vx.data();
-  double* ovy = vy.data();
-  const int n = s.nowned;
-  VHD_OMP_PARALLEL_FOR
-  for (int e = 1; e <= n; ++e) {
-    double aux = 0, auy = 0, avx = 0, avy = 0;
-    for (int k = start[e]; k < start[e + 1]; ++k) {
-      const double a = pu[index[k]], b = pv[index[k]];
-      aux += wx[k] * a;
-      auy += wy[k] * a;
-      avx += wx[k] * b;
-      avy += wy[k] * b;
-    }
-    oux[e] = aux;
-    ouy[e] = auy;
-    ovx[e] = avx;
-    ovy[e] = avy;
-  }
+  ApplyStencil2D<2>(s, {u.data(), v.data()}, {ux.data(), vx.data()}, {uy.data(), vy.data()});
 }
 
 void CALCGRADIENTVELOCITYELEMENT3D(const GradientStencil& s, const Array1<double>& u, const Array1<double>& v,

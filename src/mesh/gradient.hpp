@@ -110,9 +110,22 @@ void SetupBoundaryGradient2D(const Mesh& mesh, const Array1<int>& element_flags,
 
 // ---- stencil application (hot loop: one pass over the stencil per call) ----
 
+// One field and its gradient arrays: the multi-field routines take a span of
+// these (for instance eta, P and Q of the flow solver).
+struct GradientField {
+  const Array1<double>* value = nullptr;
+  Array1<double>* gx = nullptr;
+  Array1<double>* gy = nullptr;
+};
+
 // gx, gy (gz) must hold at least nelements entries.
 void CALCGRADIENTELEMENT2D(const GradientStencil& s, const Array1<double>& phi, Array1<double>& gx,
                            Array1<double>& gy);
+// Several fields (for instance eta, P, Q) in one pass over the stencil (more
+// than four fields: one pass per group of four): each stencil entry's element
+// number and weights are read once for all fields. Each field's gradient
+// equals CALCGRADIENTELEMENT2D on it alone, bit for bit.
+void CALCGRADIENTALLELEMENT2D(const GradientStencil& s, std::span<const GradientField> fields);
 void CALCGRADIENTELEMENT3D(const GradientStencil& s, const Array1<double>& phi, Array1<double>& gx,
                            Array1<double>& gy, Array1<double>& gz);
 // Both velocity components in one pass over the stencil.
@@ -126,13 +139,6 @@ void CALCGRADIENTVELOCITYELEMENT3D(const GradientStencil& s, const Array1<double
                                    Array1<double>& wz);
 
 // ---- Green-Gauss ("simple") gradients ----
-
-// One field and its gradient arrays (gz only in 3D).
-struct GradientField {
-  const Array1<double>* value = nullptr;
-  Array1<double>* gx = nullptr;
-  Array1<double>* gy = nullptr;
-};
 
 void CALCGRADIENTSIMPLE2D(const Mesh& mesh, const Array1<double>& phi, Array1<double>& gx, Array1<double>& gy);
 // Several fields (for instance eta, d, P, Q) in one pass over the faces.

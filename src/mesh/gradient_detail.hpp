@@ -1,7 +1,9 @@
 #pragma once
 // Small helpers shared by the gradient, limiter and interpolation kernels.
 
+#include <algorithm>
 #include <cmath>
+#include <type_traits>
 
 #include "core/array1.hpp"
 
@@ -31,6 +33,23 @@ inline double DeltaX(double a, double b, bool geographic) {
     else if (d < -kPi) d += 2 * kPi;
   }
   return d;
+}
+
+// Multi-field kernels are compiled for a fixed number of fields, so that the
+// per-field sums live in registers. Calls run(std::integral_constant<int, n>,
+// first) for consecutive groups of n <= kFieldGroup fields starting at first.
+inline constexpr int kFieldGroup = 4;
+
+template <class Run>
+void ForFieldGroups(int count, Run&& run) {
+  for (int first = 0; first < count; first += kFieldGroup) {
+    switch (std::min(kFieldGroup, count - first)) {
+      case 1: run(std::integral_constant<int, 1>(), first); break;
+      case 2: run(std::integral_constant<int, 2>(), first); break;
+      case 3: run(std::integral_constant<int, 3>(), first); break;
+      default: run(std::integral_constant<int, 4>(), first); break;
+    }
+  }
 }
 
 }  // namespace vhd::detail

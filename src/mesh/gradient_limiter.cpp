@@ -3,6 +3,7 @@
 #include "mesh/gradient_limiter.hpp"
 
 #include <algorithm>
+#include <array>
 #include <string>
 
 #include "core/omp.hpp"
@@ -15,11 +16,108 @@ namespace {
 
 using detail::FlagView;
 
-// Barth-Jespersen over the faces of each element; gz pointers are null in 2D.
-template <bool kThree>
-void BarthJespersen(const Mesh& mesh, const Array1<double>& phi, const Array1<int>& element_flags,
-                    const double* gx_in, const double* gy_in, const double* gz_in, double* gx_out,
-                    double* gy_out, double* gz_out, double eps) {
+// Barth-Jespersen factor alpha of one field on element e with unlimited
+// gradient (gx, gy): slot j < count is a face towards an active neighbour
+// when active[j], with neighbour nb[j] and face-centre offset (dx[j], dy[j]).
+// Slots are visited in local face order. Inlined into the element loops, so
+// that the neighbour activity stays in registers across the fields.
+[[gnu::always_inline]] inline double BarthJespersenAlpha(const double* p, int e, double gx, double gy, int count,
+                                                         const int* nb, const bool* active, const double* dx,
+                                                         const double* dy, double eps) {
+  const double pe = p[e];
+  double pmax = pe, pmin = pe;
+  for (int j = 0; j < count; ++j) {
+    if (!active[j]) continue;
+    pmax = std::max(pmax, p[nb[j]]);
+    pmin = std::min(pmin, p[nb[j]]);
+  }
+  const double dmax = pmax - pe, dmin = pmin - pe;
+  double alpha = 1.0;
+  for (int j = 0; j < count; ++j) {
+    if (!active[j]) continue;
+    const double d = gx * dx[j] + gy * dy[j];
+    // af = min(1, dmax/d) for d > eps, min(1, dmin/d) for d < -eps, else 1;
+    // the quotient is formed only when it is below 1, which gives the same
+    // bits (a correctly rounded quotient of a ratio >= 1 is >= 1) and spares
+    // the division on the faces that do not limit.
+    double af = 1.0;
+    if (d > eps) {
+      if (dmax < d) af = dmax / d;
+    } else if (d < -eps) {
+      if (dmin > d) af = dmin / d;
+    }
+    alpha = std::min(alpha, af);
+  }
+  return alpha;
+}
+
+// Raw arrays of n fields limited in one pass (outputs may be the inputs).
+template <int n>
+struct BarthJespersenFields {
+  std::array<const double*, n> phi, gx_in, gy_in;
+  std::array<double*, n> gx_out, gy_out;
+};
+
+// Barth-Jespersen through the precomputed table: the element's neighbours,
+// their activity and the offsets are read once for all n fields.
+template <int n>
+void BarthJespersenTable(const LimiterGeometry2D& g, const Array1<int>& element_flags,
+                         const BarthJespersenFields<n>& f, double eps) {
+  const FlagView flags(element_flags, Array1<int>());
+  const auto* neighbour = g.neighbour.data();
+  const auto* offset_x = g.dx.data();
+  const auto* offset_y = g.dy.data();
+  const int nelements = g.nelements;
+  VHD_OMP_PARALLEL_FOR
+  for (int e = 1; e <= nelements; ++e) {
+    const int* nb = neighbour[e].data();
+    const bool own = flags.Active(e);
+    bool active[kLimiterFaces2D];
+    for (int j = 0; j < kLimiterFaces2D; ++j) active[j] = own && nb[j] != 0 && flags.Active(nb[j]);
+    for (int i = 0; i < n; ++i) {
+      const double gx = f.gx_in[i][e], gy = f.gy_in[i][e];
+      const double alpha = BarthJespersenAlpha(f.phi[i], e, gx, gy, kLimiterFaces2D, nb, active, offset_x[e].data(),
+                                               offset_y[e].data(), eps);
+      f.gx_out[i][e] = alpha * gx;
+      f.gy_out[i][e] = alpha * gy;
+    }
+  }
+}
+
+// Barth-Jespersen through the mesh face table: the same factor, with the
+// neighbours and offsets gathered per element on the fly.
+void BarthJespersenMesh(const Mesh& mesh, const Array1<int>& element_flags, const double* p, const double* gx_in,
+                        const double* gy_in, double* gx_out, double* gy_out, double eps) {
+  const ElementTable& el = mesh.elements;
+  const FaceTable& fc = mesh.faces;
+  const FlagView flags(element_flags, Array1<int>());
+  const bool geo = IsGeographic(mesh.projection);
+  const int n = el.nelements_int > 0 ? el.nelements_int : el.nelements;
+  VHD_OMP_PARALLEL_FOR
+  for (int e = 1; e <= n; ++e) {
+    int nb[kMaxElementFaces];
+    bool active[kMaxElementFaces];
+    double dx[kMaxElementFaces], dy[kMaxElementFaces];
+    const bool own = flags.Active(e);
+    const int count = std::min(ElementFaceCount(el, e), kMaxElementFaces);
+    for (int j = 0; j < count; ++j) {
+      const int f = el.face_list[el.face_start[e] + j];
+      nb[j] = f == 0 ? 0 : (fc.element1[f] == e ? fc.element2[f] : fc.element1[f]);
+      active[j] = own && nb[j] != 0 && flags.Active(nb[j]);
+      dx[j] = active[j] ? detail::DeltaX(el.xc[e], fc.xf[f], geo) : 0.0;
+      dy[j] = active[j] ? fc.yf[f] - el.yc[e] : 0.0;
+    }
+    const double gx = gx_in[e], gy = gy_in[e];
+    const double alpha = BarthJespersenAlpha(p, e, gx, gy, count, nb, active, dx, dy, eps);
+    gx_out[e] = alpha * gx;
+    gy_out[e] = alpha * gy;
+  }
+}
+
+// Barth-Jespersen over all faces of the elements of a 3D mesh.
+void BarthJespersen3D(const Mesh& mesh, const Array1<double>& phi, const Array1<int>& element_flags,
+                      const double* gx_in, const double* gy_in, const double* gz_in, double* gx_out,
+                      double* gy_out, double* gz_out, double eps) {
   const ElementTable& el = mesh.elements;
   const FaceTable& fc = mesh.faces;
   const FlagView flags(element_flags, Array1<int>());
@@ -28,7 +126,7 @@ void BarthJespersen(const Mesh& mesh, const Array1<double>& phi, const Array1<in
   const double* p = phi.data();
   VHD_OMP_PARALLEL_FOR
   for (int e = 1; e <= n; ++e) {
-    const double gx = gx_in[e], gy = gy_in[e], gz = kThree ? gz_in[e] : 0.0;
+    const double gx = gx_in[e], gy = gy_in[e], gz = gz_in[e];
     double alpha = 1.0;
     if (flags.Active(e)) {
       const double pe = p[e];
@@ -48,8 +146,8 @@ void BarthJespersen(const Mesh& mesh, const Array1<double>& phi, const Array1<in
         if (f == 0) continue;
         const int nb = fc.element1[f] == e ? fc.element2[f] : fc.element1[f];
         if (nb == 0 || !flags.Active(nb)) continue;
-        double d = gx * detail::DeltaX(el.xc[e], fc.xf[f], geo) + gy * (fc.yf[f] - el.yc[e]);
-        if (kThree) d += gz * (fc.zf[f] - el.zc[e]);
+        const double d = gx * detail::DeltaX(el.xc[e], fc.xf[f], geo) + gy * (fc.yf[f] - el.yc[e]) +
+                         gz * (fc.zf[f] - el.zc[e]);
         double af = 1.0;
         if (d > eps) af = std::min(1.0, dmax / d);
         else if (d < -eps) af = std::min(1.0, dmin / d);
@@ -58,7 +156,7 @@ void BarthJespersen(const Mesh& mesh, const Array1<double>& phi, const Array1<in
     }
     gx_out[e] = alpha * gx;
     gy_out[e] = alpha * gy;
-    if (kThree) gz_out[e] = alpha * gz;
+    gz_out[e] = alpha * gz;
   }
 }
 
@@ -98,18 +196,65 @@ void Eno(const Mesh& mesh, const Array1<int>& element_flags, const Array1<int>& 
 
 }  // namespace
 
+void SetupLimiterGeometry2D(const Mesh& mesh, LimiterGeometry2D& geometry) {
+  const ElementTable& el = mesh.elements;
+  const FaceTable& fc = mesh.faces;
+  const bool geo = IsGeographic(mesh.projection);
+  LimiterGeometry2D& g = geometry;
+  g.nelements = el.nelements_int > 0 ? el.nelements_int : el.nelements;
+  g.neighbour.assign(g.nelements, {0, 0, 0, 0});
+  g.dx.assign(g.nelements, {0.0, 0.0, 0.0, 0.0});
+  g.dy.assign(g.nelements, {0.0, 0.0, 0.0, 0.0});
+  for (int e = 1; e <= g.nelements; ++e) {
+    if (ElementFaceCount(el, e) > kLimiterFaces2D)
+      FatalError(SubstituteValue(
+          SubstituteValue("SetupLimiterGeometry2D: element % has % faces; a 2D element has at most 4", el.id[e]),
+          ElementFaceCount(el, e)));
+    for (int j = 0; j < ElementFaceCount(el, e); ++j) {
+      const int f = el.face_list[el.face_start[e] + j];
+      if (f == 0) continue;
+      g.neighbour[e][j] = fc.element1[f] == e ? fc.element2[f] : fc.element1[f];
+      g.dx[e][j] = detail::DeltaX(el.xc[e], fc.xf[f], geo);
+      g.dy[e][j] = fc.yf[f] - el.yc[e];
+    }
+  }
+}
+
 void CALCLIMITEDGRADIENTBJ2D(const Mesh& mesh, const Array1<double>& phi, const Array1<int>& element_flags,
                              const Array1<double>& gx_in, const Array1<double>& gy_in, Array1<double>& gx_out,
                              Array1<double>& gy_out, double eps) {
-  BarthJespersen<false>(mesh, phi, element_flags, gx_in.data(), gy_in.data(), nullptr, gx_out.data(),
-                        gy_out.data(), nullptr, eps);
+  BarthJespersenMesh(mesh, element_flags, phi.data(), gx_in.data(), gy_in.data(), gx_out.data(), gy_out.data(),
+                     eps);
+}
+
+void CALCLIMITEDGRADIENTBJ2D(const LimiterGeometry2D& geometry, const Array1<double>& phi,
+                             const Array1<int>& element_flags, const Array1<double>& gx_in,
+                             const Array1<double>& gy_in, Array1<double>& gx_out, Array1<double>& gy_out,
+                             double eps) {
+  const BarthJespersenFields<1> f{{phi.data()}, {gx_in.data()}, {gy_in.data()}, {gx_out.data()}, {gy_out.data()}};
+  BarthJespersenTable<1>(geometry, element_flags, f, eps);
+}
+
+void CALCLIMITEDGRADIENTALLBJ2D(const LimiterGeometry2D& geometry, const Array1<int>& element_flags,
+                                std::span<const GradientField> fields, double eps) {
+  detail::ForFieldGroups(static_cast<int>(fields.size()), [&](auto group, int first) {
+    constexpr int n = decltype(group)::value;
+    BarthJespersenFields<n> f;
+    for (int i = 0; i < n; ++i) {
+      const GradientField& field = fields[static_cast<std::size_t>(first + i)];
+      f.phi[i] = field.value->data();
+      f.gx_in[i] = f.gx_out[i] = field.gx->data();
+      f.gy_in[i] = f.gy_out[i] = field.gy->data();
+    }
+    BarthJespersenTable<n>(geometry, element_flags, f, eps);
+  });
 }
 
 void CALCLIMITEDGRADIENTBJ3D(const Mesh& mesh, const Array1<double>& phi, const Array1<int>& element_flags,
                              const Array1<double>& gx_in, const Array1<double>& gy_in, const Array1<double>& gz_in,
                              Array1<double>& gx_out, Array1<double>& gy_out, Array1<double>& gz_out, double eps) {
-  BarthJespersen<true>(mesh, phi, element_flags, gx_in.data(), gy_in.data(), gz_in.data(), gx_out.data(),
-                       gy_out.data(), gz_out.data(), eps);
+  BarthJespersen3D(mesh, phi, element_flags, gx_in.data(), gy_in.data(), gz_in.data(), gx_out.data(),
+                   gy_out.data(), gz_out.data(), eps);
 }
 
 void CALCLIMITEDGRADIENTENO2D(const Mesh& mesh, const Array1<int>& element_flags, const Array1<int>& face_flags,

@@ -10,9 +10,10 @@
 //    extrapolated increment D = g . (x_f - x_e):
 //      alpha_f = min(1, (phi_max - phi_e)/D) if D > eps,
 //                min(1, (phi_min - phi_e)/D) if D < -eps, else 1;
-//    the limited gradient is min_f(alpha_f) g. Faces without an active
-//    neighbour (boundary, dry) neither widen the bounds nor limit, so an
-//    element whose neighbours are all dry keeps its gradient.
+//    the limited gradient is min_f(alpha_f) g, with eps >= 0 the scheme's
+//    small threshold. Faces without an active neighbour (boundary, dry)
+//    neither widen the bounds nor limit, so an element whose neighbours are
+//    all dry keeps its gradient.
 //  ENO: of e's own gradient and the gradients of its valid face neighbours
 //    (a face without a valid neighbour offers e's own gradient again), the one
 //    of smallest magnitude; a candidate replaces the choice only when strictly
@@ -36,8 +37,21 @@
 // region. Barth-Jespersen may limit in place (output arrays = input arrays);
 // ENO and the weighted limiter read the neighbours' unlimited gradients and
 // need separate output arrays.
+//
+// Fast 2D Barth-Jespersen: LimiterGeometry2D holds, per element and local
+// face, the element across the face and the offset of the face centre from
+// the centroid, so that the time loop reads three small rows per element
+// instead of walking the face table and recomputing offsets. The table is
+// pure geometry (no flags), built once at setup; drying and flooding need no
+// rebuild. All Barth-Jespersen entry points give the same results bit for bit,
+// whether a field is limited alone, with others in one pass, through the mesh
+// or through the table, on any number of threads.
+
+#include <array>
+#include <span>
 
 #include "core/array1.hpp"
+#include "mesh/gradient.hpp"
 #include "mesh/mesh.hpp"
 
 namespace vhd {
@@ -47,9 +61,44 @@ inline constexpr int kLimiterENO = 1;
 inline constexpr int kLimiterWeighted = 2;
 inline constexpr int kLimiterBarthJespersen = 3;
 
+// Local faces per element in the 2D limiter table (triangles use 3 slots).
+inline constexpr int kLimiterFaces2D = 4;
+
+// Per-element neighbours and face-centre offsets of a 2D mesh, in the
+// element's local face order. Slot j of element e: neighbour[e][j] is the
+// element across local face j+1 (0: boundary face, or the unused fourth slot
+// of a triangle), (dx, dy)[e][j] the face centre minus e's centroid (x taken
+// the short way round the globe on a geographic mesh). 80 bytes per element;
+// neighbours may be halo elements, whose values the limiter reads.
+struct LimiterGeometry2D {
+  int nelements = 0;  // rows: the owned elements, which the limiter loops visit
+  Array1<std::array<int, kLimiterFaces2D>> neighbour;
+  Array1<std::array<double, kLimiterFaces2D>> dx, dy;
+};
+
+// Builds the table of the owned elements of a 2D mesh (the table is
+// replaced). An element with more than four faces (a 3D mesh) is the fatal
+// error "SetupLimiterGeometry2D: element % has % faces; a 2D element has at
+// most 4".
+void SetupLimiterGeometry2D(const Mesh& mesh, LimiterGeometry2D& geometry);
+
+// Barth-Jespersen through the mesh face table (no setup needed).
 void CALCLIMITEDGRADIENTBJ2D(const Mesh& mesh, const Array1<double>& phi, const Array1<int>& element_flags,
                              const Array1<double>& gx_in, const Array1<double>& gy_in, Array1<double>& gx_out,
                              Array1<double>& gy_out, double eps);
+// The same through the precomputed table: the hot-loop form.
+void CALCLIMITEDGRADIENTBJ2D(const LimiterGeometry2D& geometry, const Array1<double>& phi,
+                             const Array1<int>& element_flags, const Array1<double>& gx_in,
+                             const Array1<double>& gy_in, Array1<double>& gx_out, Array1<double>& gy_out,
+                             double eps);
+// Several fields (for instance eta, P, Q) limited in place in one pass over
+// the elements (more than four fields: one pass per group of four): field i
+// scales *fields[i].gx and *fields[i].gy by its own alpha from
+// *fields[i].value. Each field's result equals limiting it alone; the fields'
+// gradient arrays must be distinct.
+void CALCLIMITEDGRADIENTALLBJ2D(const LimiterGeometry2D& geometry, const Array1<int>& element_flags,
+                                std::span<const GradientField> fields, double eps);
+
 void CALCLIMITEDGRADIENTBJ3D(const Mesh& mesh, const Array1<double>& phi, const Array1<int>& element_flags,
                              const Array1<double>& gx_in, const Array1<double>& gy_in, const Array1<double>& gz_in,
                              Array1<double>& gx_out, Array1<double>& gy_out, Array1<double>& gz_out, double eps);
