@@ -286,11 +286,18 @@ int CTqMapProjection::Convergence(double lon, double lat, double& gamma) const {
       return kCartOk;
     case Kind::Projected: break;
   }
-  proj_errno_reset(crs_);
-  PJ_FACTORS f = proj_factors(crs_, proj_coord(lon * kDegToRad, lat * kDegToRad, 0, 0));
-  if (proj_errno(crs_) != 0 || !std::isfinite(f.meridian_convergence))
+  // The direction of true north in the projection, from the image of a short
+  // step along the meridian (central difference). Asking PROJ for the scale
+  // factors of the CRS instead would look the conversion up in its database
+  // anew at every call, some 10^8 instructions each.
+  const double step = 1e-5;  // degrees of latitude, about 1 m
+  double x1, y1, x2, y2;
+  if (Geo2Proj(lon, lat - step, x1, y1) != kCartOk || Geo2Proj(lon, lat + step, x2, y2) != kCartOk)
     return kCartConversionFailed;
-  gamma = f.meridian_convergence / kDegToRad;
+  if (!std::isfinite(x1) || !std::isfinite(x2) || (x1 == x2 && y1 == y2)) return kCartConversionFailed;
+  // Positive where grid north lies east of true north (east of the central
+  // meridian of a transverse Mercator projection in the northern hemisphere).
+  gamma = std::atan2(-(x2 - x1), y2 - y1) / kDegToRad;
   return kCartOk;
 }
 
