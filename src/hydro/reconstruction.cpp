@@ -7,27 +7,14 @@ namespace vhd {
 
 namespace {
 
-// Gradient of one field, limited with the wet/dry codes as activity flags.
-// Barth-Jespersen scales in place; ENO and the weighted limiter read the
-// neighbours' unlimited gradients from the work arrays.
+// Gradient of one field limited by ENO or the weighted limiter, with the
+// wet/dry codes as activity flags: the limiters read the neighbours'
+// unlimited gradients from the work arrays.
 void LimitedGradient(const HdModule& hd, HdSolver& s, const Mesh& mesh, const Array1<double>& phi,
                      Array1<double>& gx, Array1<double>& gy) {
-  const int limiter = hd.solution.gradient_limiter;
-  const Array1<int>& active = hd.state.wetdry;
-  switch (limiter) {
-    case kLimiterNone:
-      CALCGRADIENTELEMENT2D(s.gradient, phi, gx, gy);
-      return;
-    case kLimiterBarthJespersen:
-      CALCGRADIENTELEMENT2D(s.gradient, phi, gx, gy);
-      CALCLIMITEDGRADIENTBJ2D(mesh, phi, active, gx, gy, gx, gy, s.limiter_epsilon);
-      return;
-    default:
-      CALCGRADIENTELEMENT2D(s.gradient, phi, s.gradient_x, s.gradient_y);
-      CALCLIMITEDGRADIENT2D(limiter, mesh, phi, active, Array1<int>(), s.gradient_x, s.gradient_y, gx, gy,
-                            s.limiter_epsilon);
-      return;
-  }
+  CALCGRADIENTELEMENT2D(s.gradient, phi, s.gradient_x, s.gradient_y);
+  CALCLIMITEDGRADIENT2D(hd.solution.gradient_limiter, mesh, phi, hd.state.wetdry, Array1<int>(), s.gradient_x,
+                        s.gradient_y, gx, gy, s.limiter_epsilon);
 }
 
 }  // namespace
@@ -38,6 +25,7 @@ void SetupReconstructionHD(const HdModule& hd, const Mesh& mesh, HdSolver& s) {
   SetupGradient(mesh, sol.gradient_calculation, Array1<int>(), Array1<int>(), 2, sol.boundary_correction, 0,
                 s.gradient);
   const bool second = sol.scheme_of_space_discretization_horizontal == 2;
+  if (second && sol.gradient_limiter == kLimiterBarthJespersen) SetupLimiterGeometry2D(mesh, s.limiter_geometry);
   if (second && (sol.gradient_limiter == kLimiterENO || sol.gradient_limiter == kLimiterWeighted)) {
     s.gradient_x.assign(mesh.elements.nelements, 0.0);
     s.gradient_y.assign(mesh.elements.nelements, 0.0);
@@ -46,6 +34,16 @@ void SetupReconstructionHD(const HdModule& hd, const Mesh& mesh, HdSolver& s) {
 
 void UpdateReconstructionHD(HdModule& hd, HdSolver& s, const Mesh& mesh) {
   const HdState& st = hd.state;
+  const int limiter = hd.solution.gradient_limiter;
+  if (limiter == kLimiterNone || limiter == kLimiterBarthJespersen) {
+    // The three fields in one pass over the stencil and the limiter table.
+    const GradientField fields[3] = {
+        {&st.eta, &s.eta_x, &s.eta_y}, {&st.P, &s.P_x, &s.P_y}, {&st.Q, &s.Q_x, &s.Q_y}};
+    CALCGRADIENTALLELEMENT2D(s.gradient, fields);
+    if (limiter == kLimiterBarthJespersen)
+      CALCLIMITEDGRADIENTALLBJ2D(s.limiter_geometry, st.wetdry, fields, s.limiter_epsilon);
+    return;
+  }
   LimitedGradient(hd, s, mesh, st.eta, s.eta_x, s.eta_y);
   LimitedGradient(hd, s, mesh, st.P, s.P_x, s.P_y);
   LimitedGradient(hd, s, mesh, st.Q, s.Q_x, s.Q_y);

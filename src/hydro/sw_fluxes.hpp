@@ -58,6 +58,7 @@
 #include "hydro/hd_module.hpp"
 #include "hydro/riemann.hpp"
 #include "mesh/gradient.hpp"
+#include "mesh/gradient_limiter.hpp"
 #include "mesh/mesh.hpp"
 
 namespace vhd {
@@ -97,6 +98,8 @@ struct HdSolver {
   // Gradient stencil (second order or eddy viscosity), built once at setup,
   // and the unlimited gradients read by the ENO and weighted limiters.
   GradientStencil gradient;
+  // Neighbours and face offsets of the Barth-Jespersen limiter, built once.
+  LimiterGeometry2D limiter_geometry;
   Array1<double> gradient_x, gradient_y;
   // Per element: limited gradients of eta, P, Q (second order).
   Array1<double> eta_x, eta_y, P_x, P_y, Q_x, Q_y;
