@@ -1,13 +1,18 @@
 // Setup cost of a large mesh: generating a mesh of about 1,000,000 jittered
-// triangles (or mixed triangles and quadrilaterals), and building its faces,
-// geometry and neighbour tables. Reports the peak resident memory of the
-// process as a counter (MiB).
+// triangles (or mixed triangles and quadrilaterals), reading it back from an
+// ASCII .mesh and a .zrnu file, and building its faces, geometry and
+// neighbour tables. Reports the peak resident memory of the process as a
+// counter (MiB).
 
 #include <benchmark/benchmark.h>
+
+#include <filesystem>
+#include <string>
 
 #include "log/log.hpp"
 #include "mesh/generate.hpp"
 #include "mesh/mesh.hpp"
+#include "mesh/read_mesh.hpp"
 
 namespace {
 
@@ -54,8 +59,32 @@ void BM_SetupMeshGeometry(benchmark::State& state) {
   state.counters["peak_MiB"] = vhd::PeakMemoryMiB();
 }
 
+// Reading the generated mesh from a file (0: ASCII .mesh, 1: .zrnu) and
+// building its geometry: the whole mesh setup of a run.
+void BM_ReadMeshAndGeometry(benchmark::State& state) {
+  const std::string file = (std::filesystem::temp_directory_path() /
+                            (state.range(0) == 0 ? "vhd_bench_1m.mesh" : "vhd_bench_1m.zrnu"))
+                               .string();
+  {
+    vhd::Mesh generated;
+    vhd::GenerateRectangleMesh(MillionSpec(vhd::CellLayout::kRandomTriangles), generated);
+    if (state.range(0) == 0) vhd::WriteMeshAscii(generated, file);
+    else vhd::WriteMeshZrnu(generated, file);
+  }
+  for (auto _ : state) {
+    vhd::Mesh mesh;
+    vhd::ReadMeshFile(mesh, file);
+    vhd::SetupMeshGeometry(mesh);
+    benchmark::DoNotOptimize(mesh.faces.nx.data());
+    state.counters["elements"] = mesh.elements.nelements;
+  }
+  state.counters["peak_MiB"] = vhd::PeakMemoryMiB();
+  std::filesystem::remove(file);
+}
+
 }  // namespace
 
+BENCHMARK(BM_ReadMeshAndGeometry)->Arg(0)->Arg(1)->Unit(benchmark::kMillisecond)->Iterations(2);
 BENCHMARK(BM_GenerateMesh)->Unit(benchmark::kMillisecond)->Iterations(3);
 BENCHMARK(BM_SetupMeshGeometry)
     ->Arg(static_cast<int>(vhd::CellLayout::kRandomTriangles))
