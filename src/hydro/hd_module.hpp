@@ -27,6 +27,7 @@
 // solver's own work arrays and kernels (face fluxes, time integration) live in
 // their own header.
 
+#include <cmath>
 #include <string>
 #include <vector>
 
@@ -131,7 +132,7 @@ struct HdFloodDry {
   Array1<double> mass_cut;
 };
 
-// One data specification of a per-element coefficient: a constant (format 0),
+// One input definition of a per-element coefficient: a constant (format 0),
 // values from a mesh data file read once (format 2), or a mesh data file that
 // varies in time (format 3).
 struct ElementField {
@@ -359,6 +360,19 @@ double CflLengthHD(const Mesh& mesh, int e);
 // flood/dry codes; afterwards h = eta + d >= 0 in every element and the
 // blow-up elevation limit is set.
 void InitialiseStateHD(HdModule& hd, const Mesh& mesh);
+
+// Per-element formulas shared by the whole-array routines below and the fused
+// end-of-step pass of the time stepping.
+// Velocity from flux: flux / h for a wet element (code 1) with h > 0, else 0.
+inline double VelocityFromFluxHD(int code, double h, double flux) {
+  return code == kWet && h > 0.0 ? flux / h : 0.0;
+}
+// Bed shear stress (N/m2) of drag coefficient cf and velocity (u, v).
+inline void BedShearStressHD(double cf, double u, double v, double& tau_x, double& tau_y) {
+  const double speed = std::sqrt(u * u + v * v);
+  tau_x = kPhysical.rho0 * cf * u * speed;
+  tau_y = kPhysical.rho0 * cf * v * speed;
+}
 
 // u = P/h, v = Q/h for wet elements (code 1), else 0.
 void CALCVELOCITYFROMFLUX(HdState& s);

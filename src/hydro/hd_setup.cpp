@@ -432,7 +432,7 @@ void CALCVELOCITYFROMFLUXCOMPONENT(HdState& s, int component) {
   const int* code = s.wetdry.data();
   const int ne = s.nelements;
   VHD_OMP_PARALLEL_FOR
-  for (int e = 1; e <= ne; ++e) vel[e] = code[e] == kWet && h[e] > 0.0 ? flux[e] / h[e] : 0.0;
+  for (int e = 1; e <= ne; ++e) vel[e] = VelocityFromFluxHD(code[e], h[e], flux[e]);
 }
 
 void CALCFLUXFROMVELOCITYCOMPONENT(HdState& s, int component) {

@@ -347,19 +347,11 @@ void CALCDRAGCOEFMANNINGSURFACE(HdModule& hd, const Array1<double>& ice_factor) 
 void CALCBEDSHEARSTRESS(HdModule& hd) {
   HdState& s = hd.state;
   const int nown = s.nelements_owned;
-  const double rho0 = kPhysical.rho0;
   VHD_OMP_PARALLEL_FOR
   for (int e = 1; e <= nown; ++e) {
-    if (s.wetdry[e] == kWet && s.h[e] > 0.0) {
-      const double u = s.P[e] / s.h[e];
-      const double v = s.Q[e] / s.h[e];
-      const double speed = std::sqrt(u * u + v * v);
-      s.tau_x[e] = rho0 * s.cf[e] * u * speed;
-      s.tau_y[e] = rho0 * s.cf[e] * v * speed;
-    } else {
-      s.tau_x[e] = 0.0;
-      s.tau_y[e] = 0.0;
-    }
+    const double u = VelocityFromFluxHD(s.wetdry[e], s.h[e], s.P[e]);
+    const double v = VelocityFromFluxHD(s.wetdry[e], s.h[e], s.Q[e]);
+    BedShearStressHD(s.cf[e], u, v, s.tau_x[e], s.tau_y[e]);
   }
 }
 

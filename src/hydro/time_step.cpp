@@ -21,7 +21,6 @@ constexpr double kRadToDeg = 57.29577951308232;
 bool VelocityStressAndBlowUpTest(HdModule& hd) {
   HdState& st = hd.state;
   const int ne = st.nelements, nown = st.nelements_owned;
-  const double rho0 = kPhysical.rho0;
   const double limit = hd.flood_dry.elevation_limit;
   const bool depth_test = hd.flood_dry.type <= 0;
   const int* code = st.wetdry.data();
@@ -37,17 +36,12 @@ bool VelocityStressAndBlowUpTest(HdModule& hd) {
   int failed = 0;
   VHD_OMP_PARALLEL_FOR_REDUCTION(max, failed)
   for (int e = 1; e <= ne; ++e) {
-    double ue = 0.0, ve = 0.0;
-    if (code[e] == kWet && h[e] > 0.0) {
-      ue = P[e] / h[e];
-      ve = Q[e] / h[e];
-    }
+    const double ue = VelocityFromFluxHD(code[e], h[e], P[e]);
+    const double ve = VelocityFromFluxHD(code[e], h[e], Q[e]);
     u[e] = ue;
     v[e] = ve;
     if (e > nown) continue;
-    const double speed = std::sqrt(ue * ue + ve * ve);
-    tau_x[e] = rho0 * cf[e] * ue * speed;
-    tau_y[e] = rho0 * cf[e] * ve * speed;
+    BedShearStressHD(cf[e], ue, ve, tau_x[e], tau_y[e]);
     if (!(eta[e] <= limit) || (depth_test && !(h[e] > 0.0))) failed = 1;
   }
   return failed != 0;

@@ -1,4 +1,4 @@
-// Time-varying input data: reading a specification, the soft start,
+// Time-varying input data: reading an input definition, the soft start,
 // interpolation in time, the coverage check and the table lookup.
 
 #include "io/dataspec.hpp"

@@ -1,8 +1,8 @@
 #pragma once
-// Time-varying input data: one specification per quantity that may vary in
+// Time-varying input data: one input definition per quantity that may vary in
 // time or space (a forcing, a boundary value, a source value, a coefficient).
 //
-// A specification is a constant or a data file read item by item:
+// An input definition is a constant or a data file read item by item:
 //   format 0  constant values;
 //   format 1  a data file read at every time (point series, line, grid or
 //             mesh file; which kind follows from the file and the caller);
@@ -18,10 +18,10 @@
 // since the simulation start.
 //
 // This file holds what needs only the setup file and the log: reading a
-// specification, the soft start, interpolation in time, the check that a file
+// input definition, the soft start, interpolation in time, the check that a file
 // covers the simulation and the table lookup. Opening the file and carrying
 // its values onto a mesh is in mesh/femdata.hpp; the open-file state lives in
-// the specification so that each quantity owns its file.
+// the input definition so that each quantity owns its file.
 
 #include <span>
 #include <string>
@@ -45,7 +45,7 @@ inline constexpr int kSoftStartSine = 2;
 inline constexpr int kTimeInterpolationLinear = 1;
 inline constexpr int kTimeInterpolationCircular = 2;  // and above: angles in degrees
 
-// What a caller expects of the file behind a specification.
+// What a caller expects of the file behind an input definition.
 enum class FemDataExpect {
   kPoint,  // one value: a point series (.zrn0)
   kLine,   // values along a line or boundary: a point series or a line series (.zrn1)
@@ -54,7 +54,7 @@ enum class FemDataExpect {
   kArea,   // any area: a point series, a grid or a mesh file
 };
 
-// The open data file of a specification and the two file steps that bracket
+// The open data file of an input definition and the two file steps that bracket
 // the current time, already carried onto the caller's targets (elements,
 // nodes, faces or points). Filled by FemDataOpen; read by FemDataRead.
 struct DataFileState {
@@ -103,13 +103,13 @@ struct DataSpec {
   DataFileState state;
 };
 
-// Sets up a specification of n components with the caller's defaults and
+// Sets up an input definition of n components with the caller's defaults and
 // nothing read: constant values, item numbers 1..n (or the defaults given),
 // reference values 0, linear time interpolation.
 void InitDataSpec(DataSpec& spec, int n, const std::vector<double>& default_values = {},
                   const std::vector<int>& default_items = {});
 
-// Reads a specification from the current setup section (the caller has
+// Reads an input definition from the current setup section (the caller has
 // opened it). Keywords: format; constant_value(s) (format 0); file_name and
 // item_number(s) (formats 1..3); type_of_soft_start, soft_time_interval,
 // reference_value(s), type_of_time_interpolation (always);

@@ -516,7 +516,7 @@ void UpdateBracket(DataSpec& spec, double t) {
   st.t2 = times[static_cast<std::size_t>(s + 1)];
 }
 
-// Brings the bracket of a file specification to time t and returns the
+// Brings the bracket of a file input definition to time t and returns the
 // weight of the later step.
 double BringToTime(DataSpec& spec, double t) {
   DataFileState& st = spec.state;

@@ -1,6 +1,6 @@
 #pragma once
 // Time-varying input data on the mesh: opening the data file of a
-// specification (io/dataspec.hpp) and the value at a time t on the caller's
+// input definition (io/dataspec.hpp) and the value at a time t on the caller's
 // elements, nodes, faces or points.
 //
 // Kinds of file and where their values go:
@@ -43,7 +43,7 @@ namespace vhd {
 
 enum class FemDataLocation { kElements, kNodes, kFaces, kPoints };
 
-// What the caller wants of a specification's file, and where.
+// What the caller wants of an input definition's file, and where.
 struct FemDataRequest {
   FemDataExpect expect = FemDataExpect::kPoint;
   FemDataLocation location = FemDataLocation::kPoints;
@@ -62,7 +62,7 @@ struct FemDataRequest {
   std::vector<int> item_types;
 };
 
-// Opens and checks the file of a specification of format 1, 2 or 3 and reads
+// Opens and checks the file of an input definition of format 1, 2 or 3 and reads
 // the first bracketing steps; formats 0 and 4 need no file and only record
 // the number of targets. start: simulation start; duration: seconds to the
 // simulation end. Formats 1 and 3 must cover the whole simulation.
@@ -75,7 +75,7 @@ void FemDataOpen(DataSpec& spec, const FemDataRequest& request, const TimeAxis& 
 void FemDataRead(DataSpec& spec, int k, double t, Array1<double>& values);
 // The value of component k at time t at one target (from 1).
 double FemDataValue(DataSpec& spec, int k, double t, int target = 1);
-// Number of targets of an opened specification.
+// Number of targets of an opened input definition.
 int FemDataTargets(const DataSpec& spec);
 
 // Closes the file (its summary goes to the log).

@@ -1,4 +1,4 @@
-// Time-varying input specifications: keywords and defaults, the soft start,
+// Time-varying input input definitions: keywords and defaults, the soft start,
 // interpolation in time, the coverage check and the table lookup.
 
 #include "io/dataspec.hpp"
