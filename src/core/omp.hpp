@@ -13,6 +13,9 @@
 #define VHD_OMP_SINGLE VHD_PRAGMA(omp single)
 #define VHD_OMP_BARRIER VHD_PRAGMA(omp barrier)
 #define VHD_OMP_PARALLEL_FOR_REDUCTION(op, var) VHD_PRAGMA(omp parallel for schedule(static) reduction(op : var))
+// A loop of independent iterations written for vector lanes (selects, no
+// early exits): evaluated several iterations at a time.
+#define VHD_OMP_SIMD VHD_PRAGMA(omp simd)
 #else
 #define VHD_OMP_PARALLEL_FOR
 #define VHD_OMP_PARALLEL
@@ -21,6 +24,7 @@
 #define VHD_OMP_SINGLE
 #define VHD_OMP_BARRIER
 #define VHD_OMP_PARALLEL_FOR_REDUCTION(op, var)
+#define VHD_OMP_SIMD
 #endif
 
 namespace vhd {

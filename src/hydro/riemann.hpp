@@ -158,20 +158,15 @@ inline FrameFlux HllStar(const SideFrame& L, const SideFrame& R, const FrameFlux
 inline FrameFlux RoeFlux(const SideFrame& L, const SideFrame& R, int entropy_fix, double g) {
   const FrameFlux central = CentralFlux(L, R);
   const double c0 = std::sqrt(0.5 * g * (L.h + R.h));
-  double un, ut, inv_c0;
+  // Roe averages of the velocity where both sides are wet, else the mean.
+  // One division for both 1 / (sl + sr) and 1 / c0.
   const double sl = L.sqh, sr = R.sqh;
-  if (L.wet && R.wet && sl + sr > 0) {
-    // One division for both 1 / (sl + sr) and 1 / c0.
-    const double q = 1.0 / ((sl + sr) * c0);
-    const double w = c0 * q;
-    inv_c0 = (sl + sr) * q;
-    un = (sl * L.un + sr * R.un) * w;
-    ut = (sl * L.ut + sr * R.ut) * w;
-  } else {
-    inv_c0 = 1.0 / c0;
-    un = 0.5 * (L.un + R.un);
-    ut = 0.5 * (L.ut + R.ut);
-  }
+  const bool roe = L.wet & R.wet & (sl + sr > 0);
+  const double q = 1.0 / ((roe ? sl + sr : 1.0) * c0);
+  const double w = c0 * q;
+  const double inv_c0 = roe ? (sl + sr) * q : q;
+  const double un = roe ? (sl * L.un + sr * R.un) * w : 0.5 * (L.un + R.un);
+  const double ut = roe ? (sl * L.ut + sr * R.ut) * w : 0.5 * (L.ut + R.ut);
   const double deta = R.eta - L.eta;
   const double dqn = R.qn - L.qn;
   const double dqt = R.qt - L.qt;
@@ -203,15 +198,27 @@ inline void TwoRarefactionSpeeds(const SideFrame& L, const SideFrame& R, double&
   SR = R.dry ? L.un + 2.0 * L.c : std::max(R.un + R.c, ustar + cstar);
 }
 
+// Selects a or b as a whole; written as selects of values (no early return)
+// so that a loop over many faces can evaluate every case and pick per face.
+inline FrameFlux SelectFlux(bool take_a, const FrameFlux& a, const FrameFlux& b) {
+  return {take_a ? a.mass : b.mass, take_a ? a.mn : b.mn, take_a ? a.mt : b.mt, take_a ? a.d : b.d};
+}
+
+// Upwind flux of the outer wave speeds SL, SR: the left flux for SL >= 0, the
+// right flux for SR <= 0, else the star flux (the mean where the two speeds
+// coincide and the star flux is undefined).
+inline FrameFlux UpwindSelect(double SL, double SR, const FrameFlux& FL, const FrameFlux& FR,
+                              const FrameFlux& star) {
+  const bool degenerate = std::abs(SR - SL) <= riemann_detail::kDegenerateSpeed;
+  return SelectFlux(SL >= 0, FL, SelectFlux(SR <= 0, FR, SelectFlux(degenerate, MeanFlux(FL, FR), star)));
+}
+
 inline FrameFlux HllFlux(const SideFrame& L, const SideFrame& R) {
   double SL, SR, ustar;
   TwoRarefactionSpeeds(L, R, SL, SR, ustar);
   const FrameFlux FL = PhysicalFlux(L);
-  if (SL >= 0) return FL;
   const FrameFlux FR = PhysicalFlux(R);
-  if (SR <= 0) return FR;
-  if (std::abs(SR - SL) <= riemann_detail::kDegenerateSpeed) return MeanFlux(FL, FR);
-  return HllStar(L, R, FL, FR, SL, SR);
+  return UpwindSelect(SL, SR, FL, FR, HllStar(L, R, FL, FR, SL, SR));
 }
 
 // HLLC after Toro: the HLL mass and normal momentum, the tangential momentum
@@ -223,16 +230,13 @@ inline FrameFlux HllcFlux(const SideFrame& L, const SideFrame& R, double g) {
   const double SL = L.dry ? R.un - 2.0 * R.c : std::min(L.un - L.c, uroe - croe);
   const double SR = R.dry ? L.un + 2.0 * L.c : std::max(R.un + R.c, uroe + croe);
   const FrameFlux FL = PhysicalFlux(L);
-  if (SL >= 0) return FL;
   const FrameFlux FR = PhysicalFlux(R);
-  if (SR <= 0) return FR;
-  if (std::abs(SR - SL) <= riemann_detail::kDegenerateSpeed) return MeanFlux(FL, FR);
-  FrameFlux F = HllStar(L, R, FL, FR, SL, SR);
+  FrameFlux star = HllStar(L, R, FL, FR, SL, SR);
   const double num = SL * R.h * (R.un - SR) - SR * L.h * (L.un - SL);
   const double den = R.h * (R.un - SR) - L.h * (L.un - SL);
   const double Sstar = den != 0 ? num / den : 0.5 * (SL + SR);
-  F.mt = F.mass * (Sstar >= 0 ? L.ut : R.ut);
-  return F;
+  star.mt = star.mass * (Sstar >= 0 ? L.ut : R.ut);
+  return UpwindSelect(SL, SR, FL, FR, star);
 }
 
 // HLLC with contact speed u* of the two-rarefaction estimate and the mean of
@@ -243,26 +247,22 @@ inline FrameFlux HllcMeanPressureFlux(const SideFrame& L, const SideFrame& R) {
   l.dry = L.empty;
   r.dry = R.empty;
   TwoRarefactionSpeeds(l, r, SL, SR, Sstar);
-  if (!L.empty && R.empty) {
-    SL = L.un - L.c;
-    SR = Sstar = L.un + 2.0 * L.c;
-  } else if (L.empty && !R.empty) {
-    SL = Sstar = R.un - 2.0 * R.c;
-    SR = R.un + R.c;
-  }
-  if (SL >= 0) return PhysicalFlux(L);
-  if (SR <= 0) return PhysicalFlux(R);
+  // One side without depth: its dry-front speed is the contact.
+  const bool only_left = !L.empty && R.empty, only_right = L.empty && !R.empty;
+  const double front_left = L.un + 2.0 * L.c, front_right = R.un - 2.0 * R.c;
+  SL = only_left ? L.un - L.c : only_right ? front_right : SL;
+  SR = only_left ? front_left : only_right ? R.un + R.c : SR;
+  Sstar = only_left ? front_left : only_right ? front_right : Sstar;
   const double pstar = 0.5 * (L.p + R.p);
   const double dstar = 0.5 * (L.d + R.d);
   constexpr double eps = 1e-16;
-  if (Sstar >= 0) {
-    const double hs = L.h * (SL - L.un + eps) / (SL - Sstar + eps);
-    const double qs = hs * Sstar;
-    return {qs, qs * Sstar + pstar, qs * L.ut, dstar};
-  }
-  const double hs = R.h * (SR - R.un + eps) / (SR - Sstar + eps);
+  // Star state on the side of the contact.
+  const bool left = Sstar >= 0;
+  const double h = left ? L.h : R.h, un = left ? L.un : R.un, S = left ? SL : SR;
+  const double hs = h * (S - un + eps) / (S - Sstar + eps);
   const double qs = hs * Sstar;
-  return {qs, qs * Sstar + pstar, qs * R.ut, dstar};
+  const FrameFlux star{qs, qs * Sstar + pstar, qs * (left ? L.ut : R.ut), dstar};
+  return SelectFlux(SL >= 0, PhysicalFlux(L), SelectFlux(SR <= 0, PhysicalFlux(R), star));
 }
 
 [[gnu::always_inline]] inline RiemannFlux RiemannFaceFluxUnit(const RiemannSide& L, const RiemannSide& R,
@@ -274,7 +274,7 @@ inline FrameFlux HllcMeanPressureFlux(const SideFrame& L, const SideFrame& R) {
   FrameFlux f;
   switch (solver) {
     case 1:
-      f = L.h + R.h <= h_min ? CentralFlux(fl, fr) : RoeFlux(fl, fr, entropy_fix, g);
+      f = SelectFlux(L.h + R.h <= h_min, CentralFlux(fl, fr), RoeFlux(fl, fr, entropy_fix, g));
       break;
     case 2: f = HllFlux(fl, fr); break;
     case 3: f = HllcFlux(fl, fr, g); break;

@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <cmath>
+#include <limits>
 #include <numbers>
 #include <string>
 
@@ -86,16 +87,14 @@ inline void CarriedVelocity(const int* code, const double* h, const double* P, c
 }
 
 // Bounds the face velocity of a side componentwise by umax, vmax; the
-// fluxes follow the velocity.
+// fluxes follow the velocity. (Selects, so that the batched face loop runs it
+// in vector lanes.)
 inline void BoundVelocity(RiemannSide& side, double umax, double vmax) {
-  if (std::abs(side.u) > umax) {
-    side.u = std::copysign(umax, side.u);
-    side.P = side.u * side.h;
-  }
-  if (std::abs(side.v) > vmax) {
-    side.v = std::copysign(vmax, side.v);
-    side.Q = side.v * side.h;
-  }
+  const bool cut_u = std::abs(side.u) > umax, cut_v = std::abs(side.v) > vmax;
+  side.u = cut_u ? std::copysign(umax, side.u) : side.u;
+  side.P = cut_u ? side.u * side.h : side.P;
+  side.v = cut_v ? std::copysign(vmax, side.v) : side.v;
+  side.Q = cut_v ? side.v * side.h : side.Q;
 }
 
 // The face flux of an element whose outflow is limited (factor theta < 1).
@@ -110,39 +109,15 @@ void ZeroFace(HdSolver& s, int f) {
   s.f_mass[f] = s.f_mx1[f] = s.f_my1[f] = s.f_mx2[f] = s.f_my2[f] = 0.0;
 }
 
-// One interior face: classification, reconstruction, flux and the signed
-// contributions of each side. Every input of the face is read once; faces
-// without a wet side return before any arithmetic.
+// Face values of the two sides of interior face f (l, r hold the centre
+// values on entry): with second order the reconstructed values, clipped and
+// sign-kept as the settings ask; then the face d and face depth of each side.
+// Returns true when a second-order face fell back to first order next to a
+// nearly dry side (always true with first order).
 template <bool kSecond>
-inline void InteriorFace(const FaceLoopInput& in, HdSolver& s, double* face_flux, double* face_flux_len, int f,
-                         double theta = 1.0) {
-  const int L = in.e1[f], R = in.e2[f];
-  const int cL = in.code[L], cR = in.code[R];
-  if (cL != kWet && cR != kWet) {  // dry-dry (or flooded) faces carry nothing
-    ZeroFace(s, f);
-    face_flux[f] = face_flux_len[f] = 0.0;
-    return;
-  }
-  const double ex = in.ex[f], ey = in.ey[f], nn = in.nn[f];
-  const double nlen = nn * in.len[f];  // length of the normal times the face length
-  const double df = in.face_d[f];
-  SideValues l{in.eta[L], in.P[L], in.Q[L], in.d[L], in.h[L]};
-  SideValues r{in.eta[R], in.P[R], in.Q[R], in.d[R], in.h[R]};
+inline bool FaceSideValues(const FaceLoopInput& in, int f, int L, int R, SideValues& l, SideValues& r) {
   const double etaL = l.eta, etaR = r.eta;  // centre values
   const double hL = l.h, hR = r.h;
-
-  bool riemann;
-  if (cL == kWet && cR == kWet) {
-    riemann = true;
-  } else if (cL == kWet && cR == kFlooded) {
-    riemann = kSecond || etaL + r.d > 0;
-  } else if (cL == kFlooded && cR == kWet) {
-    riemann = kSecond || l.d + etaR > 0;
-  } else {
-    riemann = false;  // wet against dry: land treatment of the wet side
-  }
-
-  // A second-order face falls back to first order next to a nearly dry side.
   bool first = !kSecond;
   if constexpr (kSecond) {
     const double limit = 0.05 * (in.h_min + hL + hR);
@@ -179,8 +154,36 @@ inline void InteriorFace(const FaceLoopInput& in, HdSolver& s, double* face_flux
   // too: its contact speed u* = (u_L + u_R)/2 + c_L - c_R would move water at
   // rest whose two sides see different depths.
   if (in.fad != 0 && (!first || !kSecond || in.solver == 4)) {
+    const double df = in.face_d[f];
     FaceDepth(l, df);
     FaceDepth(r, df);
+  }
+  return first;
+}
+
+// Terms of interior face f from the face values l, r of its sides: the flux
+// of the Riemann solver, or the land treatment of the wet side against a dry
+// one, and the signed contributions of each side (scaled by theta, the
+// outflow factor of the upwind element).
+template <bool kSecond>
+void InteriorFaceTerms(const FaceLoopInput& in, HdSolver& s, double* face_flux, double* face_flux_len, int f,
+                       const SideValues& l, const SideValues& r, bool first, double theta) {
+  const int L = in.e1[f], R = in.e2[f];
+  const int cL = in.code[L], cR = in.code[R];
+  const double etaL = in.eta[L], etaR = in.eta[R];  // centre values
+  const double hL = in.h[L], hR = in.h[R];
+  const double ex = in.ex[f], ey = in.ey[f], nn = in.nn[f];
+  const double nlen = nn * in.len[f];  // length of the normal times the face length
+
+  bool riemann;
+  if (cL == kWet && cR == kWet) {
+    riemann = true;
+  } else if (cL == kWet && cR == kFlooded) {
+    riemann = kSecond || etaL + in.d[R] > 0;
+  } else if (cL == kFlooded && cR == kWet) {
+    riemann = kSecond || in.d[L] + etaR > 0;
+  } else {
+    riemann = false;  // wet against dry: land treatment of the wet side
   }
   const double kL = in.k[L], kR = in.k[R];
   const double g = in.g;
@@ -293,6 +296,165 @@ inline void InteriorFace(const FaceLoopInput& in, HdSolver& s, double* face_flux
   }
 }
 
+// One interior face, every case: classification, face values, flux and the
+// signed contributions of each side. Faces without a wet side return before
+// any arithmetic.
+template <bool kSecond>
+inline void InteriorFace(const FaceLoopInput& in, HdSolver& s, double* face_flux, double* face_flux_len, int f,
+                         double theta = 1.0) {
+  const int L = in.e1[f], R = in.e2[f];
+  if (in.code[L] != kWet && in.code[R] != kWet) {  // dry-dry (or flooded) faces carry nothing
+    ZeroFace(s, f);
+    face_flux[f] = face_flux_len[f] = 0.0;
+    return;
+  }
+  SideValues l{in.eta[L], in.P[L], in.Q[L], in.d[L], in.h[L]};
+  SideValues r{in.eta[R], in.P[R], in.Q[R], in.d[R], in.h[R]};
+  const bool first = FaceSideValues<kSecond>(in, f, L, R, l, r);
+  InteriorFaceTerms<kSecond>(in, s, face_flux, face_flux_len, f, l, r, first, theta);
+}
+
+// Interior faces whose two sides are wet and at least h_min deep at the face
+// ("plain wet faces", most faces of a run) are gathered side by side in
+// batches and their fluxes evaluated in vector lanes; they take exactly the
+// path of InteriorFaceTerms for such faces, so the results do not depend on
+// the batching. Every other face takes InteriorFaceTerms directly.
+constexpr int kFaceBatch = 64;
+
+struct WetFaceBatch {
+  int n = 0;
+  int face[kFaceBatch];
+  // Face values per side (l, r): depth, face d, P, Q, depth correction and
+  // the centre eta of the bed-slope term; the face geometry; the eddy flux.
+  double hl[kFaceBatch], hr[kFaceBatch], dl[kFaceBatch], dr[kFaceBatch];
+  double Pl[kFaceBatch], Pr[kFaceBatch], Ql[kFaceBatch], Qr[kFaceBatch];
+  double kl[kFaceBatch], kr[kFaceBatch], etal[kFaceBatch], etar[kFaceBatch];
+  double ex[kFaceBatch], ey[kFaceBatch], nn[kFaceBatch], len[kFaceBatch];
+  double Dx[kFaceBatch], Dy[kFaceBatch];
+  // Second order: the velocity bound of the face (infinite where the face fell
+  // back to first order) from the centre velocities of its sides.
+  double umax[kFaceBatch], vmax[kFaceBatch];
+  // Results: flux per unit length and times the length, momentum of each side.
+  double Fh[kFaceBatch], mass[kFaceBatch];
+  double mx1[kFaceBatch], my1[kFaceBatch], mx2[kFaceBatch], my2[kFaceBatch];
+};
+
+// Adds a plain wet face to the batch.
+template <bool kSecond>
+inline void AddWetFace(const FaceLoopInput& in, WetFaceBatch& b, int f, int L, int R, const SideValues& l,
+                       const SideValues& r, bool first) {
+  const int i = b.n++;
+  b.face[i] = f;
+  b.hl[i] = l.h, b.hr[i] = r.h, b.dl[i] = l.d, b.dr[i] = r.d;
+  b.Pl[i] = l.P, b.Pr[i] = r.P, b.Ql[i] = l.Q, b.Qr[i] = r.Q;
+  b.kl[i] = in.k[L], b.kr[i] = in.k[R], b.etal[i] = in.eta[L], b.etar[i] = in.eta[R];
+  const double ex = in.ex[f], ey = in.ey[f], nn = in.nn[f], len = in.len[f];
+  b.ex[i] = ex, b.ey[i] = ey, b.nn[i] = nn, b.len[i] = len;
+  double Dx = 0.0, Dy = 0.0;
+  if (in.eddy) {
+    EddyFlux(0.5 * (in.nu[L] + in.nu[R]), 0.5 * (in.h[L] + in.h[R]), 0.5 * (in.ux[L] + in.ux[R]),
+             0.5 * (in.uy[L] + in.uy[R]), 0.5 * (in.vx[L] + in.vx[R]), 0.5 * (in.vy[L] + in.vy[R]), ex, ey,
+             nn * len, Dx, Dy);
+  }
+  b.Dx[i] = Dx, b.Dy[i] = Dy;
+  if constexpr (kSecond) {
+    double uL, vL, uR, vR;
+    if (first) {
+      b.umax[i] = b.vmax[i] = std::numeric_limits<double>::infinity();
+    } else {
+      CarriedVelocity(in.code, in.h, in.P, in.Q, in.h_min, L, uL, vL);
+      CarriedVelocity(in.code, in.h, in.P, in.Q, in.h_min, R, uR, vR);
+      b.umax[i] = std::max(std::abs(uL), std::abs(uR));
+      b.vmax[i] = std::max(std::abs(vL), std::abs(vR));
+    }
+  }
+}
+
+// Fluxes and side contributions of the plain wet faces of a batch, the
+// solver type fixed at compile time.
+template <int kSolver, bool kSecond>
+[[gnu::noinline]] void WetFaceKernel(const FaceLoopInput& in, WetFaceBatch& b) {
+  const int n = b.n;
+  const double h_min = in.h_min, g = in.g, sqrt_g = in.sqrt_g;
+  const int entropy_fix = in.entropy_fix;
+  VHD_OMP_SIMD
+  for (int i = 0; i < n; ++i) {
+    RiemannSide sl, sr;
+    sl.h = b.hl[i], sl.d = b.dl[i], sl.hp = b.hl[i] + b.kl[i];
+    sl.P = b.Pl[i], sl.Q = b.Ql[i];
+    const double invl = 1.0 / b.hl[i];
+    sl.u = b.Pl[i] * invl, sl.v = b.Ql[i] * invl;
+    sr.h = b.hr[i], sr.d = b.dr[i], sr.hp = b.hr[i] + b.kr[i];
+    sr.P = b.Pr[i], sr.Q = b.Qr[i];
+    const double invr = 1.0 / b.hr[i];
+    sr.u = b.Pr[i] * invr, sr.v = b.Qr[i] * invr;
+    if constexpr (kSecond) {
+      BoundVelocity(sl, b.umax[i], b.vmax[i]);
+      BoundVelocity(sr, b.umax[i], b.vmax[i]);
+    }
+    const double ex = b.ex[i], ey = b.ey[i], nn = b.nn[i];
+    const RiemannFlux F = RiemannFaceFluxUnit(sl, sr, ex, ey, nn, h_min, kSolver, entropy_fix, b.len[i], g, sqrt_g);
+    const double fx = F.momx - b.Dx[i], fy = F.momy - b.Dy[i];
+    const double bd = g * F.d * (nn * b.len[i]);
+    const double bL = (b.etal[i] + b.kl[i]) * bd, bR = (b.etar[i] + b.kr[i]) * bd;
+    b.Fh[i] = F.Fh;
+    b.mass[i] = F.mass;
+    b.mx1[i] = -fx + bL * ex;
+    b.my1[i] = -fy + bL * ey;
+    b.mx2[i] = fx - bR * ex;
+    b.my2[i] = fy - bR * ey;
+  }
+}
+
+template <bool kSecond>
+void WetFaceFluxes(const FaceLoopInput& in, WetFaceBatch& b) {
+  switch (in.solver) {
+    case 1: WetFaceKernel<1, kSecond>(in, b); break;
+    case 2: WetFaceKernel<2, kSecond>(in, b); break;
+    case 3: WetFaceKernel<3, kSecond>(in, b); break;
+    case 4: WetFaceKernel<4, kSecond>(in, b); break;
+    default: WetFaceKernel<0, kSecond>(in, b); break;
+  }
+}
+
+// Interior faces first .. last of the face list, in batches.
+template <bool kSecond>
+void InteriorFaceChunk(const FaceLoopInput& in, HdSolver& s, double* face_flux, double* face_flux_len,
+                       const int* faces, int first_index, int last_index, WetFaceBatch& b) {
+  b.n = 0;
+  for (int i = first_index; i <= last_index; ++i) {
+    const int f = faces[i];
+    const int L = in.e1[f], R = in.e2[f];
+    const int cL = in.code[L], cR = in.code[R];
+    if (cL != kWet && cR != kWet) {  // dry-dry (or flooded) faces carry nothing
+      ZeroFace(s, f);
+      face_flux[f] = face_flux_len[f] = 0.0;
+      continue;
+    }
+    SideValues l{in.eta[L], in.P[L], in.Q[L], in.d[L], in.h[L]};
+    SideValues r{in.eta[R], in.P[R], in.Q[R], in.d[R], in.h[R]};
+    const bool first = FaceSideValues<kSecond>(in, f, L, R, l, r);
+    const bool plain = cL == kWet && cR == kWet && l.h >= in.h_min && r.h >= in.h_min &&
+                       l.h > riemann_detail::kDryDepth && r.h > riemann_detail::kDryDepth;
+    if (plain) {
+      AddWetFace<kSecond>(in, b, f, L, R, l, r, first);
+    } else {
+      InteriorFaceTerms<kSecond>(in, s, face_flux, face_flux_len, f, l, r, first, 1.0);
+    }
+  }
+  WetFaceFluxes<kSecond>(in, b);
+  for (int i = 0; i < b.n; ++i) {
+    const int f = b.face[i];
+    s.f_mass[f] = b.mass[i];
+    s.f_mx1[f] = b.mx1[i];
+    s.f_my1[f] = b.my1[i];
+    s.f_mx2[f] = b.mx2[i];
+    s.f_my2[f] = b.my2[i];
+    face_flux[f] = b.Fh[i];
+    face_flux_len[f] = b.mass[i];
+  }
+}
+
 FaceLoopInput GatherInput(const HdModule& hd, const HdSolver& s, const Mesh& mesh) {
   const HdState& st = hd.state;
   const HdSolutionTechnique& sol = hd.solution;
@@ -352,12 +514,16 @@ void FaceTerms(HdModule& hd, HdSolver& s, const Mesh& mesh, const FaceLoopInput&
 
   const int ni = s.interior_faces.size();
   const int* faces = s.interior_faces.data();
-  if (in.second) {
-    VHD_OMP_FOR_NOWAIT
-    for (int i = 1; i <= ni; ++i) InteriorFace<true>(in, s, face_flux, face_flux_len, faces[i]);
-  } else {
-    VHD_OMP_FOR_NOWAIT
-    for (int i = 1; i <= ni; ++i) InteriorFace<false>(in, s, face_flux, face_flux_len, faces[i]);
+  const int nchunks = (ni + kFaceBatch - 1) / kFaceBatch;
+  WetFaceBatch batch;  // one per thread, on its stack
+  VHD_OMP_FOR_NOWAIT
+  for (int c = 0; c < nchunks; ++c) {
+    const int first = 1 + c * kFaceBatch, last = std::min(ni, (c + 1) * kFaceBatch);
+    if (in.second) {
+      InteriorFaceChunk<true>(in, s, face_flux, face_flux_len, faces, first, last, batch);
+    } else {
+      InteriorFaceChunk<false>(in, s, face_flux, face_flux_len, faces, first, last, batch);
+    }
   }
 
   const int nb = s.boundary_faces.size();
