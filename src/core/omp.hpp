@@ -12,10 +12,12 @@
 #define VHD_OMP_FOR_NOWAIT VHD_PRAGMA(omp for schedule(static) nowait)
 #define VHD_OMP_SINGLE VHD_PRAGMA(omp single)
 #define VHD_OMP_BARRIER VHD_PRAGMA(omp barrier)
-#define VHD_OMP_PARALLEL_FOR_REDUCTION(op, var) VHD_PRAGMA(omp parallel for schedule(static) reduction(op : var))
+#define VHD_OMP_PARALLEL_FOR_REDUCTION(op, ...) \
+  VHD_PRAGMA(omp parallel for schedule(static) reduction(op : __VA_ARGS__))
 // A loop of independent iterations written for vector lanes (selects, no
 // early exits): evaluated several iterations at a time.
 #define VHD_OMP_SIMD VHD_PRAGMA(omp simd)
+#define VHD_OMP_PARALLEL_FOR_SIMD VHD_PRAGMA(omp parallel for simd schedule(static))
 #else
 #define VHD_OMP_PARALLEL_FOR
 #define VHD_OMP_PARALLEL
@@ -23,8 +25,9 @@
 #define VHD_OMP_FOR_NOWAIT
 #define VHD_OMP_SINGLE
 #define VHD_OMP_BARRIER
-#define VHD_OMP_PARALLEL_FOR_REDUCTION(op, var)
+#define VHD_OMP_PARALLEL_FOR_REDUCTION(op, ...)
 #define VHD_OMP_SIMD
+#define VHD_OMP_PARALLEL_FOR_SIMD
 #endif
 
 namespace vhd {

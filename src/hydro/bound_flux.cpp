@@ -97,19 +97,17 @@ void WriteFace(HdState& st, HdSolver& s, int f, RiemannFlux F, bool wet, double 
     F.momx *= theta;
     F.momy *= theta;
   }
-  s.f_mass[f] = F.mass;
   st.face_flux[f] = F.Fh;
   st.face_flux_len[f] = F.mass;
   if (wet) {
-    s.f_mx1[f] = -F.momx + bedslope * nx;
-    s.f_my1[f] = -F.momy + bedslope * ny;
+    SetBoundaryFaceTerms(s, f, F.mass, -F.momx + bedslope * nx, -F.momy + bedslope * ny);
   } else {
-    s.f_mx1[f] = s.f_my1[f] = 0.0;
+    SetBoundaryFaceTerms(s, f, F.mass, 0.0, 0.0);
   }
 }
 
 void ZeroFace(HdState& st, HdSolver& s, int f) {
-  s.f_mass[f] = s.f_mx1[f] = s.f_my1[f] = 0.0;
+  SetBoundaryFaceTerms(s, f, 0.0, 0.0, 0.0);
   st.face_flux[f] = st.face_flux_len[f] = 0.0;
 }
 

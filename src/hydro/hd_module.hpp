@@ -313,6 +313,10 @@ struct HdModule {
   double dt_largest = 0.0;
   double dt_sum = 0.0;
   long long n_cfl_violations = 0;
+  // Largest CFL rate (1/s) of the state left by the last sub-step, formed in
+  // its end-of-step pass with state.cfl_rate; taken (once) by the next
+  // CALCTIMESTEPHD instead of a pass of its own. Negative: not available.
+  double cfl_rate_max_ready = -1.0;
 
   TimingSet timing;
   HdState state;

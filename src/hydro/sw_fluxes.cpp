@@ -105,9 +105,7 @@ inline void ScaleFlux(RiemannFlux& F, double theta) {
   F.momy *= theta;
 }
 
-void ZeroFace(HdSolver& s, int f) {
-  s.f_mass[f] = s.f_mx1[f] = s.f_my1[f] = s.f_mx2[f] = s.f_my2[f] = 0.0;
-}
+void ZeroFace(HdSolver& s, int f) { SetFaceTerms(s, f, 0.0, 0.0, 0.0, 0.0, 0.0); }
 
 // Face values of the two sides of interior face f (l, r hold the centre
 // values on entry): with second order the reconstructed values, clipped and
@@ -115,7 +113,7 @@ void ZeroFace(HdSolver& s, int f) {
 // Returns true when a second-order face fell back to first order next to a
 // nearly dry side (always true with first order).
 template <bool kSecond>
-inline bool FaceSideValues(const FaceLoopInput& in, int f, int L, int R, SideValues& l, SideValues& r) {
+[[gnu::always_inline]] inline bool FaceSideValues(const FaceLoopInput& in, int f, int L, int R, SideValues& l, SideValues& r) {
   const double etaL = l.eta, etaR = r.eta;  // centre values
   const double hL = l.h, hR = r.h;
   bool first = !kSecond;
@@ -140,7 +138,10 @@ inline bool FaceSideValues(const FaceLoopInput& in, int f, int L, int R, SideVal
       if (in.preserve_dU) {
         // Keep the sign of the jump of the centre values at the face.
         auto keep = [](double& a, double& b, double ca, double cb) {
-          if ((b - a) * (cb - ca) < 0) a = b = 0.5 * (a + b);
+          const bool opposite = (b - a) * (cb - ca) < 0;
+          const double mean = 0.5 * (a + b);
+          a = opposite ? mean : a;
+          b = opposite ? mean : b;
         };
         keep(l.eta, r.eta, etaL, etaR);
         keep(l.P, r.P, PL, PR);
@@ -232,7 +233,6 @@ void InteriorFaceTerms(const FaceLoopInput& in, HdSolver& s, double* face_flux, 
                nlen, Dx, Dy);
     }
     const double fx = F.momx - Dx, fy = F.momy - Dy;
-    s.f_mass[f] = F.mass;
     face_flux[f] = F.Fh;
     face_flux_len[f] = F.mass;
     // Bed-slope terms g X d |n| len of the wet sides (X = eta + k at the
@@ -241,37 +241,34 @@ void InteriorFaceTerms(const FaceLoopInput& in, HdSolver& s, double* face_flux, 
     // (mass only) receives the momentum that the water flowing in from the
     // wet side carries, which that side loses with its momentum flux.
     const double bd = g * F.d * nlen;
+    double mx1 = 0.0, my1 = 0.0, mx2 = 0.0, my2 = 0.0;
     if (cL == kWet) {
       const double bL = (etaL + kL) * bd;
-      s.f_mx1[f] = -fx + bL * ex;
-      s.f_my1[f] = -fy + bL * ey;
+      mx1 = -fx + bL * ex;
+      my1 = -fy + bL * ey;
     } else if (F.mass < 0) {
       double u, v;
       CarriedVelocity(in.code, in.h, in.P, in.Q, in.h_min, R, u, v);
-      s.f_mx1[f] = -F.mass * u;
-      s.f_my1[f] = -F.mass * v;
-    } else {
-      s.f_mx1[f] = s.f_my1[f] = 0.0;
+      mx1 = -F.mass * u;
+      my1 = -F.mass * v;
     }
     if (cR == kWet) {
       const double bR = (etaR + kR) * bd;
-      s.f_mx2[f] = fx - bR * ex;
-      s.f_my2[f] = fy - bR * ey;
+      mx2 = fx - bR * ex;
+      my2 = fy - bR * ey;
     } else if (F.mass > 0) {
       double u, v;
       CarriedVelocity(in.code, in.h, in.P, in.Q, in.h_min, L, u, v);
-      s.f_mx2[f] = F.mass * u;
-      s.f_my2[f] = F.mass * v;
-    } else {
-      s.f_mx2[f] = s.f_my2[f] = 0.0;
+      mx2 = F.mass * u;
+      my2 = F.mass * v;
     }
+    SetFaceTerms(s, f, F.mass, mx1, my1, mx2, my2);
     return;
   }
 
   // Land treatment of the wet side: no mass flux, the wall pressure and the
   // bed-slope term, both with the side's own face d (at rest the wall depth
   // is the side's face depth, and the two cancel at any level).
-  s.f_mass[f] = 0.0;
   face_flux[f] = face_flux_len[f] = 0.0;
   if (cL == kWet) {
     const double hs = l.h;
@@ -280,9 +277,7 @@ void InteriorFaceTerms(const FaceLoopInput& in, HdSolver& s, double* face_flux, 
     const double pw = 0.5 * g * (hw * hw - l.d * l.d) * nlen;
     const double bL = g * (etaL + kL) * l.d * nlen;
     if (in.eddy) EddyFlux(in.nu[L], hs, in.ux[L], in.uy[L], in.vx[L], in.vy[L], ex, ey, nlen, Dx, Dy);
-    s.f_mx1[f] = -(pw * ex - Dx) + bL * ex;
-    s.f_my1[f] = -(pw * ey - Dy) + bL * ey;
-    s.f_mx2[f] = s.f_my2[f] = 0.0;
+    SetFaceTerms(s, f, 0.0, -(pw * ex - Dx) + bL * ex, -(pw * ey - Dy) + bL * ey, 0.0, 0.0);
   } else {
     const double hs = r.h;
     const double un = (hs >= in.h_min && hs > 0) ? -(r.P * ex + r.Q * ey) * nn / hs : 0.0;
@@ -290,9 +285,7 @@ void InteriorFaceTerms(const FaceLoopInput& in, HdSolver& s, double* face_flux, 
     const double pw = 0.5 * g * (hw * hw - r.d * r.d) * nlen;
     const double bR = g * (etaR + kR) * r.d * nlen;
     if (in.eddy) EddyFlux(in.nu[R], hs, in.ux[R], in.uy[R], in.vx[R], in.vy[R], ex, ey, nlen, Dx, Dy);
-    s.f_mx2[f] = (pw * ex - Dx) - bR * ex;
-    s.f_my2[f] = (pw * ey - Dy) - bR * ey;
-    s.f_mx1[f] = s.f_my1[f] = 0.0;
+    SetFaceTerms(s, f, 0.0, 0.0, 0.0, (pw * ex - Dx) - bR * ex, (pw * ey - Dy) - bR * ey);
   }
 }
 
@@ -445,11 +438,7 @@ void InteriorFaceChunk(const FaceLoopInput& in, HdSolver& s, double* face_flux, 
   WetFaceFluxes<kSecond>(in, b);
   for (int i = 0; i < b.n; ++i) {
     const int f = b.face[i];
-    s.f_mass[f] = b.mass[i];
-    s.f_mx1[f] = b.mx1[i];
-    s.f_my1[f] = b.my1[i];
-    s.f_mx2[f] = b.mx2[i];
-    s.f_my2[f] = b.my2[i];
+    SetFaceTerms(s, f, b.mass[i], b.mx1[i], b.my1[i], b.mx2[i], b.my2[i]);
     face_flux[f] = b.Fh[i];
     face_flux_len[f] = b.mass[i];
   }
@@ -538,26 +527,19 @@ void FaceTerms(HdModule& hd, HdSolver& s, const Mesh& mesh, const FaceLoopInput&
     if (st.wetdry[rec.element] == kWet) {
       BoundaryFaceTerms(hd, s, mesh, rec);
     } else {
-      ZeroFace(s, rec.face);
+      SetBoundaryFaceTerms(s, rec.face, 0.0, 0.0, 0.0);
     }
   }
 }
 
-// Sums of the signed face slots of element e in its local face order.
-inline void ElementSums(const HdSolver& s, const int* start, const int* codes, int e, double& sh, double& sP,
+// Sums of the face terms of element e in its local face order.
+inline void ElementSums(const HdSolver::SideTerms* terms, const int* start, int e, double& sh, double& sP,
                         double& sQ) {
   sh = sP = sQ = 0.0;
   for (int k = start[e]; k < start[e + 1]; ++k) {
-    const int f = codes[k] >> 1;
-    if (codes[k] & 1) {
-      sh += s.f_mass[f];
-      sP += s.f_mx2[f];
-      sQ += s.f_my2[f];
-    } else {
-      sh -= s.f_mass[f];
-      sP += s.f_mx1[f];
-      sQ += s.f_my1[f];
-    }
+    sh -= terms[k].out;
+    sP += terms[k].mx;
+    sQ += terms[k].my;
   }
 }
 
@@ -576,8 +558,7 @@ inline void ElementSums(const HdSolver& s, const int* start, const int* codes, i
 int OutflowFactorsHD(HdModule& hd, HdSolver& s, const Mesh& mesh, int ne, bool first_stage, double dt) {
   const HdState& st = hd.state;
   const int* start = s.element_face_start.data();
-  const int* codes = s.element_face_code.data();
-  const double* mass = s.f_mass.data();
+  const HdSolver::SideTerms* terms = s.side_terms.data();
   const double* area = mesh.elements.area.data();
   const double* hbase = first_stage ? st.h.data() : st.h_old.data();
   double* factor = s.outflow_factor.data();
@@ -585,10 +566,7 @@ int OutflowFactorsHD(HdModule& hd, HdSolver& s, const Mesh& mesh, int ne, bool f
   VHD_OMP_PARALLEL_FOR_REDUCTION(+, nlimited)
   for (int e = 1; e <= ne; ++e) {
     double out = 0.0;
-    for (int k = start[e]; k < start[e + 1]; ++k) {
-      const double m = (codes[k] & 1) ? -mass[codes[k] >> 1] : mass[codes[k] >> 1];
-      if (m > 0) out += m;
-    }
+    for (int k = start[e]; k < start[e + 1]; ++k) out += std::max(0.0, terms[k].out);
     double theta = 1.0;
     const double held = std::max(0.0, hbase[e] + dt * s.src_h[e]) * area[e];
     if (dt * out > held) {
@@ -612,7 +590,7 @@ void LimitOutflowHD(HdModule& hd, HdSolver& s, const Mesh& mesh, const FaceLoopI
     VHD_OMP_FOR_NOWAIT
     for (int i = 1; i <= ni; ++i) {
       const int f = s.interior_faces[i];
-      const double m = s.f_mass[f];
+      const double m = face_flux_len[f];
       if (m == 0) continue;
       const double theta = factor[m > 0 ? in.e1[f] : in.e2[f]];
       if (theta >= 1.0) continue;
@@ -625,7 +603,7 @@ void LimitOutflowHD(HdModule& hd, HdSolver& s, const Mesh& mesh, const FaceLoopI
     VHD_OMP_FOR_NOWAIT
     for (int i = 1; i <= nb; ++i) {
       const BoundaryFaceRecord& rec = s.boundary_faces[i];
-      if (rec.kind == kBoundaryLand || !(s.f_mass[rec.face] > 0)) continue;
+      if (rec.kind == kBoundaryLand || !(face_flux_len[rec.face] > 0)) continue;
       const double theta = factor[rec.element];
       if (theta < 1.0) BoundaryFaceFluxHD(hd, s, mesh, rec, theta);
     }
@@ -710,11 +688,13 @@ void SetupSolverHD(HdModule& hd, const Mesh& mesh, HdSolver& s) {
     s.face_ey[f] = nn > 0 ? F.ny[f] / nn : 0.0;
   }
 
-  s.f_mass.assign(nf);
-  s.f_mx1.assign(nf);
-  s.f_my1.assign(nf);
-  s.f_mx2.assign(nf);
-  s.f_my2.assign(nf);
+  s.side_terms.assign(s.element_face_code.size());
+  s.face_slot1.assign(nf, 0);
+  s.face_slot2.assign(nf, 0);
+  for (int k = 1; k <= s.element_face_code.size(); ++k) {
+    const int code = s.element_face_code[k];
+    ((code & 1) ? s.face_slot2 : s.face_slot1)[code >> 1] = k;
+  }
   for (Array1<double>* a : {&s.src_h, &s.src_P, &s.src_Q, &s.depth_correction}) a->assign(ne, 0.0);
   s.outflow_factor.assign(ne, 1.0);
   if (second) {
@@ -753,9 +733,7 @@ void BoundaryFaceTerms(const HdModule& hd, HdSolver& s, const Mesh& mesh, const 
         EddyFlux(st.nu_t[c], hs, st.ux[c], st.uy[c], st.vx[c], st.vy[c], nx, ny, len, Dx, Dy);
       }
       const double b = g * (st.eta[c] + k) * ds * len;
-      s.f_mass[f] = 0.0;
-      s.f_mx1[f] = -(pw * nx - Dx) + b * nx;
-      s.f_my1[f] = -(pw * ny - Dy) + b * ny;
+      SetBoundaryFaceTerms(s, f, 0.0, -(pw * nx - Dx) + b * nx, -(pw * ny - Dy) + b * ny);
       break;
     }
   }
@@ -768,14 +746,14 @@ void CalcDerivativesOnlySW2D(HdModule& hd, HdSolver& s, const Mesh& mesh) {
   const int ne =
       mesh.elements.nelements_int > 0 ? mesh.elements.nelements_int : mesh.elements.nelements;
   const int* start = s.element_face_start.data();
-  const int* codes = s.element_face_code.data();
+  const HdSolver::SideTerms* terms = s.side_terms.data();
   const double* area = mesh.elements.area.data();
   VHD_OMP_PARALLEL {
     FaceTerms(hd, s, mesh, in);
     VHD_OMP_FOR
     for (int e = 1; e <= ne; ++e) {
       double sh, sP, sQ;
-      ElementSums(s, start, codes, e, sh, sP, sQ);
+      ElementSums(terms, start, e, sh, sP, sQ);
       const double inv = 1.0 / area[e];
       st.dhdt[e] = sh * inv;
       st.dPdt[e] = sP * inv;
@@ -795,7 +773,7 @@ void CALCDERIVATIVESW2D(HdModule& hd, HdSolver& s, const Mesh& mesh, int stage, 
   const int ne =
       mesh.elements.nelements_int > 0 ? mesh.elements.nelements_int : mesh.elements.nelements;
   const int* start = s.element_face_start.data();
-  const int* codes = s.element_face_code.data();
+  const HdSolver::SideTerms* terms = s.side_terms.data();
   const double* area = mesh.elements.area.data();
   const bool first_stage = stage == 1;
   const double h_min = hd.flood_dry.mass_depth;
@@ -808,7 +786,7 @@ void CALCDERIVATIVESW2D(HdModule& hd, HdSolver& s, const Mesh& mesh, int stage, 
     VHD_OMP_FOR
     for (int e = 1; e <= ne; ++e) {
       double sh, sP, sQ;
-      ElementSums(s, start, codes, e, sh, sP, sQ);
+      ElementSums(terms, start, e, sh, sP, sQ);
       const double inv = 1.0 / area[e];
       const double dhdt = sh * inv, dPdt = sP * inv, dQdt = sQ * inv;
       st.dhdt[e] = dhdt;

@@ -91,9 +91,17 @@ struct HdSolver {
   // d_f of the bed-slope term is HdState::face_d, set here at setup.)
   Array1<double> face_ex, face_ey, face_nn;
 
-  // Per face contributions of the current stage, one slot per side, already
-  // signed for that side: mass (m3/s) and momentum (m4/s2).
-  Array1<double> f_mass, f_mx1, f_my1, f_mx2, f_my2;
+  // Face terms of the current stage, one slot per element and face in the
+  // element's local face order (the rows of element_face_code), so that the
+  // element pass reads its slots one after the other: the water leaving the
+  // element through the face (m3/s, negative when it enters) and the
+  // momentum terms of that side (m4/s2). face_slot1/2 give the slots of the
+  // face's element1 and element2 sides (0 for a boundary face's outer side).
+  struct SideTerms {
+    double out = 0, mx = 0, my = 0;
+  };
+  Array1<SideTerms> side_terms;
+  Array1<int> face_slot1, face_slot2;
 
   // Gradient stencil (second order or eddy viscosity), built once at setup,
   // and the unlimited gradients read by the ENO and weighted limiters.
@@ -146,8 +154,20 @@ void CalcDerivativesOnlySW2D(HdModule& hd, HdSolver& solver, const Mesh& mesh);
 // Velocity filter after a stage (second order, type_of_filtering >= 1).
 void CALCVELOCITYFILTER2D(HdModule& hd, HdSolver& solver, const Mesh& mesh);
 
+// Terms of face f for both sides: mass flux (m3/s, positive from element1 to
+// element2) and the momentum terms of each side.
+inline void SetFaceTerms(HdSolver& s, int f, double mass, double mx1, double my1, double mx2, double my2) {
+  s.side_terms[s.face_slot1[f]] = {mass, mx1, my1};
+  s.side_terms[s.face_slot2[f]] = {-mass, mx2, my2};
+}
+
+// Terms of boundary face f for its inner side (element1).
+inline void SetBoundaryFaceTerms(HdSolver& s, int f, double mass, double mx, double my) {
+  s.side_terms[s.face_slot1[f]] = {mass, mx, my};
+}
+
 // Contributions of one boundary face from its prepared record: fills the
-// face slots of side 1 (element1) in solver.f_* . The inner element must be
+// slot of its inner side (element1) with SetBoundaryFaceTerms. The inner element must be
 // wet; land faces get the wall pressure and the bed-slope term.
 void BoundaryFaceTerms(const HdModule& hd, HdSolver& solver, const Mesh& mesh,
                        const BoundaryFaceRecord& record);

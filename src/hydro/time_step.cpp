@@ -13,28 +13,43 @@ namespace {
 
 constexpr double kRadToDeg = 57.29577951308232;
 
+// CFL rate of one element (1/s): (|u| + |v| + 2 sqrt(g h)) / length (without
+// the gravity wave when it is not part of the explicit step); -1 where the
+// element is not wet or has no depth.
+inline double CflRate(int code, double eta, double d, double u, double v, double length, bool gravity) {
+  const double h = eta + d;
+  if (code != kWet || !(h > 0)) return -1.0;
+  return (std::abs(u) + std::abs(v) + (gravity ? 2.0 * std::sqrt(kPhysical.g * h) : 0.0)) / length;
+}
+
 // The end of a sub-step in one pass over the elements: the velocities from
 // the fluxes (every element, halo included, as CALCVELOCITYFROMFLUX), the bed
-// shear stress of the new state (owned elements, as CALCBEDSHEARSTRESS), and
-// the blow-up test of CheckBlowUpHD. Returns true when an owned element fails
-// that test, so that CheckBlowUpHD walks the elements only then.
-bool VelocityStressAndBlowUpTest(HdModule& hd) {
+// shear stress of the new state and the CFL rates of the next step (owned
+// elements, as CALCBEDSHEARSTRESS and CalcCflRatesHD), and the blow-up test
+// of CheckBlowUpHD. Returns true when an owned element fails that test, so
+// that CheckBlowUpHD walks the elements only then; rmax is the largest rate.
+bool VelocityStressAndBlowUpTest(HdModule& hd, const HdSolver& solver, double& rmax) {
   HdState& st = hd.state;
   const int ne = st.nelements, nown = st.nelements_owned;
   const double limit = hd.flood_dry.elevation_limit;
   const bool depth_test = hd.flood_dry.type <= 0;
+  const bool gravity = solver.implicit_gravity == 0;
   const int* code = st.wetdry.data();
   const double* h = st.h.data();
   const double* eta = st.eta.data();
+  const double* d = st.d.data();
   const double* P = st.P.data();
   const double* Q = st.Q.data();
   const double* cf = st.cf.data();
+  const double* length = st.length.data();
   double* u = st.u.data();
   double* v = st.v.data();
   double* tau_x = st.tau_x.data();
   double* tau_y = st.tau_y.data();
+  double* rate = st.cfl_rate.data();
   int failed = 0;
-  VHD_OMP_PARALLEL_FOR_REDUCTION(max, failed)
+  double r = 0.0;
+  VHD_OMP_PARALLEL_FOR_REDUCTION(max, failed, r)
   for (int e = 1; e <= ne; ++e) {
     const double ue = VelocityFromFluxHD(code[e], h[e], P[e]);
     const double ve = VelocityFromFluxHD(code[e], h[e], Q[e]);
@@ -42,8 +57,11 @@ bool VelocityStressAndBlowUpTest(HdModule& hd) {
     v[e] = ve;
     if (e > nown) continue;
     BedShearStressHD(cf[e], ue, ve, tau_x[e], tau_y[e]);
+    rate[e] = CflRate(code[e], eta[e], d[e], ue, ve, length[e], gravity);
+    r = std::max(r, rate[e]);
     if (!(eta[e] <= limit) || (depth_test && !(h[e] > 0.0))) failed = 1;
   }
+  rmax = r;
   return failed != 0;
 }
 
@@ -52,20 +70,13 @@ bool VelocityStressAndBlowUpTest(HdModule& hd) {
 double CalcCflRatesHD(HdModule& hd, const HdSolver& solver, const Mesh& mesh) {
   HdState& st = hd.state;
   const int ne = st.nelements_owned;
-  const double g = kPhysical.g;
   const bool gravity = solver.implicit_gravity == 0;
   (void)mesh;
   double rmax = 0.0;
   VHD_OMP_PARALLEL_FOR_REDUCTION(max, rmax)
   for (int e = 1; e <= ne; ++e) {
-    const double h = st.eta[e] + st.d[e];
-    double r = -1.0;
-    if (st.wetdry[e] == kWet && h > 0) {
-      const double u = st.u[e], v = st.v[e];
-      r = (std::abs(u) + std::abs(v) + (gravity ? 2.0 * std::sqrt(g * h) : 0.0)) / st.length[e];
-      rmax = std::max(rmax, r);
-    }
-    st.cfl_rate[e] = r;
+    st.cfl_rate[e] = CflRate(st.wetdry[e], st.eta[e], st.d[e], st.u[e], st.v[e], st.length[e], gravity);
+    rmax = std::max(rmax, st.cfl_rate[e]);
   }
   return rmax;
 }
@@ -78,7 +89,9 @@ double SplitTimeStepHD(double dt, double remainder) {
 
 double CALCTIMESTEPHD(HdModule& hd, const HdSolver& solver, const Mesh& mesh, double t, double t_end) {
   const HdTimeStepControl& c = hd.time_step;
-  const double rmax = CalcCflRatesHD(hd, solver, mesh);
+  // The rates of the state left by the last sub-step come with its end pass.
+  const double rmax = hd.cfl_rate_max_ready >= 0 ? hd.cfl_rate_max_ready : CalcCflRatesHD(hd, solver, mesh);
+  hd.cfl_rate_max_ready = -1.0;
   double dt;
   if (c.CFL_critical_HD / c.dt_max_HD > rmax) {
     dt = c.dt_max_HD;
@@ -207,10 +220,12 @@ void StepHD(HdModule& hd, HdSolver& solver, const Mesh& mesh, double t, double d
   start(kHdTimerFloodDry);
   if (hd.time_step.CFL_correction_HD == 1) CHECKTIMESTEPHD(hd, mesh, dt);
   CHECKFLOODDRYHD(hd, mesh);
-  if (VelocityStressAndBlowUpTest(hd)) {
+  double rmax = 0.0;
+  if (VelocityStressAndBlowUpTest(hd, solver, rmax)) {
     int status = 0;
     if (!CheckBlowUpHD(hd, mesh, t_new, &status)) run_status = -1;
   }
+  hd.cfl_rate_max_ready = rmax;
   stop(kHdTimerFloodDry);
   stop(kHdTimerTotal);
 }

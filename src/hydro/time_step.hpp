@@ -39,7 +39,10 @@ double CalcCflRatesHD(HdModule& hd, const HdSolver& solver, const Mesh& mesh);
 // Sub-step (s) for the HD time t towards the end of the overall step t_end:
 // the CFL step bounded by dt_min and dt_max, then the remainder t_end - t
 // taken whole when the step reaches it (to a relative 1e-6), otherwise split
-// into equal steps none larger than the CFL step.
+// into equal steps none larger than the CFL step. The rates are those that
+// the last StepHD formed for the state it left (hd.cfl_rate_max_ready), else
+// CalcCflRatesHD's: code that changes the HD state between StepHD and this
+// call sets hd.cfl_rate_max_ready = -1.
 double CALCTIMESTEPHD(HdModule& hd, const HdSolver& solver, const Mesh& mesh, double t, double t_end);
 
 // The splitting rule alone: step for a CFL step dt_cfl (already bounded)

@@ -58,28 +58,60 @@ struct BarthJespersenFields {
   std::array<double*, n> gx_out, gy_out;
 };
 
-// Barth-Jespersen through the precomputed table: the element's neighbours,
-// their activity and the offsets are read once for all n fields.
-template <int n>
-void BarthJespersenTable(const LimiterGeometry2D& g, const Array1<int>& element_flags,
-                         const BarthJespersenFields<n>& f, double eps) {
-  const FlagView flags(element_flags, Array1<int>());
+// Barth-Jespersen through the precomputed table, one field after the other.
+// The factor is the one of BarthJespersenAlpha to the bit, written as
+// selects (every face evaluated; an inactive face neither widens the bounds
+// nor limits, and min(1, q) of a quotient q >= 1 is 1 as there) so that the
+// element loop runs in vector lanes. kFlags: element flags given (else every
+// element is active).
+template <bool kFlags>
+void BarthJespersenTableLanes(const LimiterGeometry2D& g, const int* flag, const double* p, const double* gx_in,
+                              const double* gy_in, double* gx_out, double* gy_out, double eps) {
   const auto* neighbour = g.neighbour.data();
   const auto* offset_x = g.dx.data();
   const auto* offset_y = g.dy.data();
   const int nelements = g.nelements;
-  VHD_OMP_PARALLEL_FOR
+  VHD_OMP_PARALLEL_FOR_SIMD
   for (int e = 1; e <= nelements; ++e) {
-    const int* nb = neighbour[e].data();
-    const bool own = flags.Active(e);
+    const bool own = !kFlags || flag[e] == 1;
+    const double pe = p[e];
+    const double gx = gx_in[e], gy = gy_in[e];
+    // Bounds over the active neighbours: an inactive face (no neighbour, 0,
+    // or an inactive one) reads the element itself, which leaves them as
+    // they are. The index is chosen by arithmetic, not by a condition: a
+    // load under a condition keeps the loop out of vector lanes.
     bool active[kLimiterFaces2D];
-    for (int j = 0; j < kLimiterFaces2D; ++j) active[j] = own && nb[j] != 0 && flags.Active(nb[j]);
-    for (int i = 0; i < n; ++i) {
-      const double gx = f.gx_in[i][e], gy = f.gy_in[i][e];
-      const double alpha = BarthJespersenAlpha(f.phi[i], e, gx, gy, kLimiterFaces2D, nb, active, offset_x[e].data(),
-                                               offset_y[e].data(), eps);
-      f.gx_out[i][e] = alpha * gx;
-      f.gy_out[i][e] = alpha * gy;
+    double pmax = pe, pmin = pe, offset[kLimiterFaces2D];
+    for (int j = 0; j < kLimiterFaces2D; ++j) {
+      const int nb = neighbour[e][j];
+      active[j] = own & (nb != 0);
+      if constexpr (kFlags) active[j] = active[j] & (flag[nb] == 1);  // flag[0] is a spare slot
+      const double q = p[e + (nb - e) * static_cast<int>(active[j])];
+      pmax = std::max(pmax, q);
+      pmin = std::min(pmin, q);
+      offset[j] = gx * offset_x[e][j] + gy * offset_y[e][j];
+    }
+    const double dmax = pmax - pe, dmin = pmin - pe;
+    double alpha = 1.0;
+    for (int j = 0; j < kLimiterFaces2D; ++j) {
+      const double d = offset[j];
+      const double af = d > eps ? std::min(1.0, dmax / d) : d < -eps ? std::min(1.0, dmin / d) : 1.0;
+      alpha = std::min(alpha, active[j] ? af : 1.0);
+    }
+    gx_out[e] = alpha * gx;
+    gy_out[e] = alpha * gy;
+  }
+}
+
+template <int n>
+void BarthJespersenTable(const LimiterGeometry2D& g, const Array1<int>& element_flags,
+                         const BarthJespersenFields<n>& f, double eps) {
+  const int* flag = element_flags.empty() ? nullptr : element_flags.data();
+  for (int i = 0; i < n; ++i) {
+    if (flag == nullptr) {
+      BarthJespersenTableLanes<false>(g, flag, f.phi[i], f.gx_in[i], f.gy_in[i], f.gx_out[i], f.gy_out[i], eps);
+    } else {
+      BarthJespersenTableLanes<true>(g, flag, f.phi[i], f.gx_in[i], f.gy_in[i], f.gx_out[i], f.gy_out[i], eps);
     }
   }
 }
