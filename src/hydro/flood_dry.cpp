@@ -4,6 +4,14 @@
 // Codes: 0 dry (no flux through any face), 1 wet (full participation),
 // 2 flooded (carries water and takes part in the mass balance, but has zero
 // velocity and receives no element sources and no drag).
+//
+// Drying is one-sided: a wet element stays wet until it falls below the
+// drying depth, while water arriving on a dry element is flooded (mass only)
+// until it reaches the mass depth. Water that has been moving keeps moving as
+// it thins, so a receding film drains with the water body; were it made
+// flooded at the mass depth, it would stop with zero velocity, and a film of
+// up to the mass depth would stay behind wherever the water has been
+// (flooded elements exchange no water among themselves).
 
 #include <algorithm>
 #include <string>
@@ -127,6 +135,8 @@ void CHECKFLOODDRYHD(HdModule& hd, const Mesh& mesh) {
     int next;
     if (prev == kDry) {
       next = h[e] > h_mass ? kWet : (h[e] > h_dry ? kFlooded : kDry);
+    } else if (prev == kWet) {
+      next = h[e] < h_dry ? kDry : kWet;
     } else {
       next = h[e] < h_dry ? kDry : (h[e] < h_mass ? kFlooded : kWet);
     }

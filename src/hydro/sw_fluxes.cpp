@@ -29,6 +29,9 @@ struct FaceLoopInput {
   bool eddy;
   const double *nu, *ux, *uy, *vx, *vy;
   double h_min, g, sqrt_g;
+  // A wet side passes its velocity from this depth on: 0 (thin water keeps
+  // its velocity) except with the type-4 solver, where it is h_min.
+  double h_move;
   int solver, entropy_fix, fad, land_condition, face_value_limiter;
   bool preserve_dU, face_limit_dry;
 };
@@ -50,6 +53,23 @@ struct SideValues {
 inline void FaceDepth(SideValues& side, double df) {
   side.d = std::max(df, -side.eta);
   side.h = side.eta + side.d;
+}
+
+// The deeper side of a face that fell back to first order next to a nearly
+// dry side. The nearly dry side keeps its centre values, d and h; the deeper
+// side keeps its centre eta and velocity (its gradients are formed across the
+// shore, where the eta of dry elements is their bed) but takes its depth at
+// the face, max(0, eta + d_f), and carries its velocity with that depth.
+// With its centre depth at the face, the deeper side of a shore face on a
+// beach would see the water deeper than it is there, push it onto the beach
+// and damp a run-up and run-down. Pressure and bed slope use the d that each
+// side passes, so water at rest stays at rest.
+inline void DeepSideAtDryFace(SideValues& side, double df) {
+  const double hc = side.h;
+  FaceDepth(side, df);
+  const double ratio = hc > 0 ? side.h / hc : 0.0;
+  side.P *= ratio;
+  side.Q *= ratio;
 }
 
 // Depth at a reflecting wall from the outgoing Riemann invariant
@@ -74,12 +94,12 @@ void EddyFlux(double nu, double hf, double ux, double uy, double vx, double vy, 
 }
 
 // Velocity (m/s) with which water leaving element e carries momentum: its
-// centre velocity when it is wet and at least h_min deep, else 0 (flooded
-// and shallow elements count as at rest, as in the fluxes).
-inline void CarriedVelocity(const int* code, const double* h, const double* P, const double* Q, double h_min,
+// centre velocity when it is wet and at least h_move deep, else 0 (flooded
+// elements count as at rest, as in the fluxes).
+inline void CarriedVelocity(const int* code, const double* h, const double* P, const double* Q, double h_move,
                             int e, double& u, double& v) {
   u = v = 0.0;
-  if (code[e] == kWet && h[e] >= h_min && h[e] > 0) {
+  if (code[e] == kWet && h[e] >= h_move && h[e] > 0) {
     const double inv = 1.0 / h[e];
     u = P[e] * inv;
     v = Q[e] * inv;
@@ -120,6 +140,7 @@ template <bool kSecond>
   if constexpr (kSecond) {
     const double limit = 0.05 * (in.h_min + hL + hR);
     first = in.face_limit_dry && (limit > hL || limit > hR);
+    if (first && in.fad != 0 && (limit > hL) != (limit > hR)) DeepSideAtDryFace(limit > hL ? r : l, in.face_d[f]);
     if (!first) {
       const double xf = in.xf[f], yf = in.yf[f];
       const double ax = xf - in.xc[L], ay = yf - in.yc[L], bx = xf - in.xc[R], by = yf - in.yc[R];
@@ -192,20 +213,24 @@ void InteriorFaceTerms(const FaceLoopInput& in, HdSolver& s, double* face_flux, 
 
   if (riemann) {
     // A side moves water only where it has a velocity: a side that is not
-    // wet or shallower than h_min passes P = Q = 0 with u = v = 0 (its
-    // momentum, e.g. what a flooded element gathers, would otherwise push
-    // water out of it that carries no momentum).
+    // wet passes P = Q = 0 with u = v = 0 (its momentum, e.g. what a flooded
+    // element gathers, would otherwise push water out of it that carries no
+    // momentum). A wet side passes its velocity down to h_move: thin water
+    // that moves with the body next to it must keep moving, or a receding
+    // film stays behind. The type-4 solver keeps thin sides at rest: its star
+    // depths from the two-rarefaction contact speed pile water up between
+    // thin sides that move apart.
     RiemannSide sl, sr;
     sl.wet = cL == kWet ? 1 : 0;
     sl.h = l.h, sl.d = l.d, sl.hp = l.h + kL;
-    if (cL == kWet && l.h >= in.h_min && l.h > 0) {
+    if (cL == kWet && l.h >= in.h_move && l.h > 0) {
       const double inv = 1.0 / l.h;
       sl.P = l.P, sl.Q = l.Q;
       sl.u = l.P * inv, sl.v = l.Q * inv;
     }
     sr.wet = cR == kWet ? 1 : 0;
     sr.h = r.h, sr.d = r.d, sr.hp = r.h + kR;
-    if (cR == kWet && r.h >= in.h_min && r.h > 0) {
+    if (cR == kWet && r.h >= in.h_move && r.h > 0) {
       const double inv = 1.0 / r.h;
       sr.P = r.P, sr.Q = r.Q;
       sr.u = r.P * inv, sr.v = r.Q * inv;
@@ -218,8 +243,8 @@ void InteriorFaceTerms(const FaceLoopInput& in, HdSolver& s, double* face_flux, 
       // flow alone and keeps thin water from being flung out.
       if (!first) {
         double uL, vL, uR, vR;
-        CarriedVelocity(in.code, in.h, in.P, in.Q, in.h_min, L, uL, vL);
-        CarriedVelocity(in.code, in.h, in.P, in.Q, in.h_min, R, uR, vR);
+        CarriedVelocity(in.code, in.h, in.P, in.Q, in.h_move, L, uL, vL);
+        CarriedVelocity(in.code, in.h, in.P, in.Q, in.h_move, R, uR, vR);
         BoundVelocity(sl, std::max(std::abs(uL), std::abs(uR)), std::max(std::abs(vL), std::abs(vR)));
         BoundVelocity(sr, std::max(std::abs(uL), std::abs(uR)), std::max(std::abs(vL), std::abs(vR)));
       }
@@ -248,7 +273,7 @@ void InteriorFaceTerms(const FaceLoopInput& in, HdSolver& s, double* face_flux, 
       my1 = -fy + bL * ey;
     } else if (F.mass < 0) {
       double u, v;
-      CarriedVelocity(in.code, in.h, in.P, in.Q, in.h_min, R, u, v);
+      CarriedVelocity(in.code, in.h, in.P, in.Q, in.h_move, R, u, v);
       mx1 = -F.mass * u;
       my1 = -F.mass * v;
     }
@@ -258,7 +283,7 @@ void InteriorFaceTerms(const FaceLoopInput& in, HdSolver& s, double* face_flux, 
       my2 = fy - bR * ey;
     } else if (F.mass > 0) {
       double u, v;
-      CarriedVelocity(in.code, in.h, in.P, in.Q, in.h_min, L, u, v);
+      CarriedVelocity(in.code, in.h, in.P, in.Q, in.h_move, L, u, v);
       mx2 = F.mass * u;
       my2 = F.mass * v;
     }
@@ -307,7 +332,7 @@ inline void InteriorFace(const FaceLoopInput& in, HdSolver& s, double* face_flux
   InteriorFaceTerms<kSecond>(in, s, face_flux, face_flux_len, f, l, r, first, theta);
 }
 
-// Interior faces whose two sides are wet and at least h_min deep at the face
+// Interior faces whose two sides are wet and at least h_move deep at the face
 // ("plain wet faces", most faces of a run) are gathered side by side in
 // batches and their fluxes evaluated in vector lanes; they take exactly the
 // path of InteriorFaceTerms for such faces, so the results do not depend on
@@ -355,8 +380,8 @@ inline void AddWetFace(const FaceLoopInput& in, WetFaceBatch& b, int f, int L, i
     if (first) {
       b.umax[i] = b.vmax[i] = std::numeric_limits<double>::infinity();
     } else {
-      CarriedVelocity(in.code, in.h, in.P, in.Q, in.h_min, L, uL, vL);
-      CarriedVelocity(in.code, in.h, in.P, in.Q, in.h_min, R, uR, vR);
+      CarriedVelocity(in.code, in.h, in.P, in.Q, in.h_move, L, uL, vL);
+      CarriedVelocity(in.code, in.h, in.P, in.Q, in.h_move, R, uR, vR);
       b.umax[i] = std::max(std::abs(uL), std::abs(uR));
       b.vmax[i] = std::max(std::abs(vL), std::abs(vR));
     }
@@ -427,7 +452,7 @@ void InteriorFaceChunk(const FaceLoopInput& in, HdSolver& s, double* face_flux, 
     SideValues l{in.eta[L], in.P[L], in.Q[L], in.d[L], in.h[L]};
     SideValues r{in.eta[R], in.P[R], in.Q[R], in.d[R], in.h[R]};
     const bool first = FaceSideValues<kSecond>(in, f, L, R, l, r);
-    const bool plain = cL == kWet && cR == kWet && l.h >= in.h_min && r.h >= in.h_min &&
+    const bool plain = cL == kWet && cR == kWet && l.h >= in.h_move && r.h >= in.h_move &&
                        l.h > riemann_detail::kDryDepth && r.h > riemann_detail::kDryDepth;
     if (plain) {
       AddWetFace<kSecond>(in, b, f, L, R, l, r, first);
@@ -480,6 +505,7 @@ FaceLoopInput GatherInput(const HdModule& hd, const HdSolver& s, const Mesh& mes
   in.vx = st.vx.data();
   in.vy = st.vy.data();
   in.h_min = hd.flood_dry.mass_depth;
+  in.h_move = sol.type_of_Riemann_solver == 4 ? in.h_min : 0.0;
   in.g = kPhysical.g;
   in.sqrt_g = std::sqrt(kPhysical.g);
   in.solver = sol.type_of_Riemann_solver;
@@ -830,6 +856,14 @@ void CALCDERIVATIVESW2D(HdModule& hd, HdSolver& s, const Mesh& mesh, int stage, 
             Pn = Ps * damped;
             Qn = Qs * damped;
           }
+        }
+        if (damp == 0.0 && hb > 0) {
+          // Not accelerated below h_min: the element keeps the velocity of
+          // the base state and its momentum follows its depth (a momentum
+          // held while the water drains away would fling it out ever faster).
+          const double scale = std::max(0.0, hn) / hb;
+          Pn = Pb * scale;
+          Qn = Qb * scale;
         }
       } else {
         Pn = Pb + dt * dPdt;

@@ -30,8 +30,14 @@
 //   - with second order, each face velocity component is bounded by the
 //     larger magnitude of that component at the two centres (P and eta are
 //     reconstructed apart, and over thin water P / h could otherwise exceed
-//     every velocity around); a side that is not wet or shallower than h_min
-//     passes P = Q = 0 with its zero velocity;
+//     every velocity around); a side that is not wet passes P = Q = 0 with
+//     its zero velocity, a wet side its velocity at any depth (with the
+//     type-4 solver only from h_min on);
+//   - a face that falls back to first order next to a nearly dry side keeps
+//     the centre values, d and h of that side only: the deeper side passes
+//     its centre eta and velocity with its depth at the face from d_f;
+//   - a wet element below h_min (damping option 1) keeps the velocity of the
+//     base state, its momentum following its depth;
 //   - the element depth correction k is zero (no depth correction is active);
 //   - the bed-slope term is g X d n len for both components (the extra
 //     g X^2/2 n_y len of the y form sums to zero over a closed element),

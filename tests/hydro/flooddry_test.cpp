@@ -39,19 +39,25 @@ struct Row {
   HdModule hd;
 };
 
-TEST(CheckFloodDry, ElementThresholdsFromAWetElement) {
-  // From wet: below h_dry dry, below h_mass flooded, from h_mass wet; the
-  // thresholds themselves: h_dry gives flooded, h_mass gives wet.
-  const double depths[] = {0.004, 0.005, 0.03, 0.08, 0.0999, 0.1, 0.5};
-  const int expected[] = {kDry, kFlooded, kFlooded, kFlooded, kFlooded, kWet, kWet};
-  Row r(7);
-  for (int e = 1; e <= 7; ++e) r.Set(e, depths[e - 1], kWet);
-  CHECKFLOODDRYHD(r.hd, r.mesh);
-  for (int e = 1; e <= 7; ++e) {
-    EXPECT_EQ(r.hd.state.wetdry[e], expected[e - 1]) << "h = " << depths[e - 1];
-    EXPECT_EQ(r.hd.state.wetdry_old[e], kWet);
+TEST(CheckFloodDry, ElementThresholdsFromAWetOrFloodedElement) {
+  // From wet: below h_dry dry, else still wet (thin water keeps moving until
+  // it dries); from flooded: below h_dry dry, below h_mass flooded, from
+  // h_mass wet. The thresholds themselves: h_dry gives wet or flooded, h_mass
+  // gives wet.
+  const double depths[] = {0.004, 0.005, 0.03, 0.0999, 0.1, 0.5};
+  const int from_wet[] = {kDry, kWet, kWet, kWet, kWet, kWet};
+  const int from_flooded[] = {kDry, kFlooded, kFlooded, kFlooded, kWet, kWet};
+  for (int old_code : {kWet, kFlooded}) {
+    const int* expected = old_code == kWet ? from_wet : from_flooded;
+    Row r(6);
+    for (int e = 1; e <= 6; ++e) r.Set(e, depths[e - 1], old_code);
+    CHECKFLOODDRYHD(r.hd, r.mesh);
+    for (int e = 1; e <= 6; ++e) {
+      EXPECT_EQ(r.hd.state.wetdry[e], expected[e - 1]) << "from " << old_code << ", h = " << depths[e - 1];
+      EXPECT_EQ(r.hd.state.wetdry_old[e], old_code);
+    }
+    EXPECT_EQ(r.hd.flood_dry.n_wet, 5);
   }
-  EXPECT_EQ(r.hd.flood_dry.n_wet, 6);
 }
 
 TEST(CheckFloodDry, ElementThresholdsFromADryElement) {
@@ -134,7 +140,7 @@ TEST(CheckFloodDry, MomentumResetRules) {
   };
   const Case cases[] = {
       {kWet, 0.5, kWet, true},         // no change
-      {kWet, 0.05, kFlooded, false},   // wet to flooded
+      {kWet, 0.05, kWet, true},        // thin wet water stays wet
       {kWet, 0.001, kDry, false},      // wet to dry
       {kFlooded, 0.5, kWet, true},     // flooded to wet: keeps what its faces brought
       {kFlooded, 0.05, kFlooded, true},

@@ -91,8 +91,8 @@ Result RunBowl(int n, int solver, int order) {
   }
   Result r;
   r.dx = 2 * kHalf / n;
-  // An element counts as under water from the mass depth on (thinner films
-  // are mass-only and stay where they are).
+  // An element counts as under water from the mass depth on (thinner water
+  // is a draining film or newly flooded, mass-only land).
   const double wet_depth = c.hd.flood_dry.mass_depth;
   for (int k = 1; k <= kSamples && c.run_status >= 0; ++k) {
     const double t = k * exact.period / kSamples;
