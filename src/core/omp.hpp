@@ -18,6 +18,8 @@
 // early exits): evaluated several iterations at a time.
 #define VHD_OMP_SIMD VHD_PRAGMA(omp simd)
 #define VHD_OMP_PARALLEL_FOR_SIMD VHD_PRAGMA(omp parallel for simd schedule(static))
+#define VHD_OMP_PARALLEL_FOR_SIMD_REDUCTION(op, ...) \
+  VHD_PRAGMA(omp parallel for simd schedule(static) reduction(op : __VA_ARGS__))
 #else
 #define VHD_OMP_PARALLEL_FOR
 #define VHD_OMP_PARALLEL
@@ -28,6 +30,7 @@
 #define VHD_OMP_PARALLEL_FOR_REDUCTION(op, ...)
 #define VHD_OMP_SIMD
 #define VHD_OMP_PARALLEL_FOR_SIMD
+#define VHD_OMP_PARALLEL_FOR_SIMD_REDUCTION(op, ...)
 #endif
 
 namespace vhd {

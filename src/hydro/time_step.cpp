@@ -49,17 +49,23 @@ bool VelocityStressAndBlowUpTest(HdModule& hd, const HdSolver& solver, double& r
   double* rate = st.cfl_rate.data();
   int failed = 0;
   double r = 0.0;
-  VHD_OMP_PARALLEL_FOR_REDUCTION(max, failed, r)
-  for (int e = 1; e <= ne; ++e) {
+  // The owned elements in vector lanes, then the velocities of the halo.
+  VHD_OMP_PARALLEL_FOR_SIMD_REDUCTION(max, failed, r)
+  for (int e = 1; e <= nown; ++e) {
     const double ue = VelocityFromFluxHD(code[e], h[e], P[e]);
     const double ve = VelocityFromFluxHD(code[e], h[e], Q[e]);
     u[e] = ue;
     v[e] = ve;
-    if (e > nown) continue;
     BedShearStressHD(cf[e], ue, ve, tau_x[e], tau_y[e]);
-    rate[e] = CflRate(code[e], eta[e], d[e], ue, ve, length[e], gravity);
-    r = std::max(r, rate[e]);
-    if (!(eta[e] <= limit) || (depth_test && !(h[e] > 0.0))) failed = 1;
+    const double re = CflRate(code[e], eta[e], d[e], ue, ve, length[e], gravity);
+    rate[e] = re;
+    r = std::max(r, re);
+    const bool bad = !(eta[e] <= limit) | (depth_test & !(h[e] > 0.0));
+    failed = std::max(failed, bad ? 1 : 0);
+  }
+  for (int e = nown + 1; e <= ne; ++e) {
+    u[e] = VelocityFromFluxHD(code[e], h[e], P[e]);
+    v[e] = VelocityFromFluxHD(code[e], h[e], Q[e]);
   }
   rmax = r;
   return failed != 0;
