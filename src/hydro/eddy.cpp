@@ -117,6 +117,7 @@ void SetupEddy(HdModule& hd, const Mesh& mesh) {
     SktCloseSection();
   }
   SktCloseSection();
+  if (ev.horizontal.type > 0) AllocateVelocityGradientsHD(hd.state);
 }
 
 void CALCEDDYVISCOSITYHD(HdModule& hd, const Mesh& mesh) {

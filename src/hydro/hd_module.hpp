@@ -79,7 +79,6 @@ struct HdState {
   Array1<int> wetdry;             // 0 dry, 1 wet, 2 flooded
   Array1<int> wetdry_old;         // code before the last flood/dry check
   Array1<double> length;          // characteristic length for the CFL number (m)
-  Array1<double> dhdt, dPdt, dQdt;  // derivatives of the current stage (m/s, m2/s2)
 
   // State at the start of the HD step, U(n): the base of every stage of the
   // one- and two-stage schemes (the working arrays h, P, Q hold U* between
@@ -88,7 +87,8 @@ struct HdState {
 
   // Velocity gradients of the element (1/s, metric factors applied on
   // geographic meshes), formed from the state at the start of the sub-step;
-  // read by the Smagorinsky model and the diffusive face fluxes.
+  // read by the Smagorinsky model and the diffusive face fluxes. Allocated
+  // only with eddy viscosity (AllocateVelocityGradientsHD).
   Array1<double> ux, uy, vx, vy;
 
   // Bed resistance and eddy viscosity.
@@ -97,11 +97,12 @@ struct HdState {
   Array1<double> tau_x, tau_y;  // bed shear stress (N/m2)
   Array1<double> nu_t;        // horizontal eddy viscosity (m2/s)
 
-  // CFL rate r (1/s, -1 where not computed) and CFL number Cr = r dt.
-  Array1<double> cfl_rate, cfl;
+  // CFL rate r (1/s, -1 where not computed) of the current state; the CFL
+  // number of a step dt is CflNumber(r, dt).
+  Array1<double> cfl_rate;
 
   // Metric factors: cos and tan of the latitude of the element centre on
-  // geographic meshes; 1 and 0 on Cartesian meshes.
+  // geographic meshes (empty on Cartesian meshes).
   Array1<double> cos_lat, tan_lat;
 
   // Per face: mass flux per unit length (m2/s) and times the face length
@@ -312,6 +313,7 @@ struct HdModule {
   double dt_smallest = 0.0;
   double dt_largest = 0.0;
   double dt_sum = 0.0;
+  double dt_last = 0.0;  // the last sub-step (s)
   long long n_cfl_violations = 0;
   // Largest CFL rate (1/s) of the state left by the last sub-step, formed in
   // its end-of-step pass with state.cfl_rate; taken (once) by the next
@@ -350,6 +352,9 @@ void SetupInitialConditionsHD(HdModule& hd);
 // Allocates every HdState array for the mesh (codes 1, metric arrays, bed
 // levels, element lengths).
 void AllocateStateHD(HdModule& hd, const Mesh& mesh);
+// Allocates the velocity gradients (ux, uy, vx, vy) once; called for a
+// module with horizontal eddy viscosity.
+void AllocateVelocityGradientsHD(HdState& s);
 
 // Element length of the CFL rate (m): L = 4 A / P, A the area and P the
 // perimeter (the sum of the face lengths). For water at rest the rate

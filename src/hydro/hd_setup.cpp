@@ -138,6 +138,11 @@ double CflLengthHD(const Mesh& mesh, int e) {
   return perimeter > 0.0 ? 4.0 * el.area[e] / perimeter : el.length[e];
 }
 
+void AllocateVelocityGradientsHD(HdState& s) {
+  if (s.ux.size() == s.nelements) return;
+  for (Array1<double>* a : {&s.ux, &s.uy, &s.vx, &s.vy}) a->assign(s.nelements, 0.0);
+}
+
 void AllocateStateHD(HdModule& hd, const Mesh& mesh) {
   HdState& s = hd.state;
   const ElementTable& el = mesh.elements;
@@ -147,11 +152,11 @@ void AllocateStateHD(HdModule& hd, const Mesh& mesh) {
   s.nfaces = mesh.faces.nfaces;
   s.nnodes = mesh.nodes.nnodes;
 
-  for (Array1<double>* a : {&s.eta, &s.d, &s.h, &s.P, &s.Q, &s.u, &s.v, &s.length, &s.dhdt, &s.dPdt, &s.dQdt,
-                            &s.h_old, &s.P_old, &s.Q_old, &s.ux, &s.uy, &s.vx, &s.vy, &s.cf, &s.cf_surface,
-                            &s.tau_x, &s.tau_y, &s.nu_t, &s.cfl_rate, &s.cfl, &s.cos_lat, &s.tan_lat}) {
+  for (Array1<double>* a : {&s.eta, &s.d, &s.h, &s.P, &s.Q, &s.u, &s.v, &s.length, &s.h_old, &s.P_old, &s.Q_old,
+                            &s.cf, &s.cf_surface, &s.tau_x, &s.tau_y, &s.nu_t, &s.cfl_rate}) {
     a->assign(ne, 0.0);
   }
+  if (hd.eddy.horizontal.type > 0) AllocateVelocityGradientsHD(s);
   s.wetdry.assign(ne, kWet);
   s.wetdry_old.assign(ne, kWet);
   s.face_flux.assign(s.nfaces, 0.0);
@@ -161,11 +166,17 @@ void AllocateStateHD(HdModule& hd, const Mesh& mesh) {
   hd.flood_dry.mass_cut.assign(ne, 0.0);
 
   const bool has_metric = el.cos_lat.size() >= ne && el.tan_lat.size() >= ne;
+  if (hd.projection == 2) {
+    s.cos_lat.assign(ne, 1.0);
+    s.tan_lat.assign(ne, 0.0);
+  }
   for (int e = 1; e <= ne; ++e) {
     s.d[e] = -el.zc[e];
     s.length[e] = CflLengthHD(mesh, e);
-    s.cos_lat[e] = hd.projection == 2 && has_metric ? el.cos_lat[e] : 1.0;
-    s.tan_lat[e] = hd.projection == 2 && has_metric ? el.tan_lat[e] : 0.0;
+    if (hd.projection == 2 && has_metric) {
+      s.cos_lat[e] = el.cos_lat[e];
+      s.tan_lat[e] = el.tan_lat[e];
+    }
     s.eta[e] = 0.0;
     s.h[e] = s.d[e];
   }
@@ -455,6 +466,7 @@ void RecordTimeStepHD(HdModule& hd, double dt) {
     hd.dt_largest = std::max(hd.dt_largest, dt);
   }
   ++hd.n_steps;
+  hd.dt_last = dt;
   hd.dt_sum += dt;
 }
 

@@ -682,11 +682,14 @@ void SetupSolverHD(HdModule& hd, const Mesh& mesh, HdSolver& s) {
   s.element_face_start.assign(ne + 1);
   s.element_face_start[1] = 1;
   for (int e = 1; e <= ne; ++e) s.element_face_start[e + 1] = s.element_face_start[e] + ElementFaceCount(E, e);
-  s.element_face_code.assign(std::max(0, s.element_face_start[ne + 1] - 1));
+  const int nslots = std::max(0, s.element_face_start[ne + 1] - 1);
+  s.side_terms.assign(nslots);
+  s.face_slot1.assign(nf, 0);
+  s.face_slot2.assign(nf, 0);
   for (int e = 1; e <= ne; ++e) {
     for (int j = 1; j <= ElementFaceCount(E, e); ++j) {
       const int f = ElementFace(E, e, j);
-      s.element_face_code[s.element_face_start[e] + j - 1] = 2 * f + (F.element1[f] == e ? 0 : 1);
+      (F.element1[f] == e ? s.face_slot1 : s.face_slot2)[f] = s.element_face_start[e] + j - 1;
     }
   }
 
@@ -714,13 +717,6 @@ void SetupSolverHD(HdModule& hd, const Mesh& mesh, HdSolver& s) {
     s.face_ey[f] = nn > 0 ? F.ny[f] / nn : 0.0;
   }
 
-  s.side_terms.assign(s.element_face_code.size());
-  s.face_slot1.assign(nf, 0);
-  s.face_slot2.assign(nf, 0);
-  for (int k = 1; k <= s.element_face_code.size(); ++k) {
-    const int code = s.element_face_code[k];
-    ((code & 1) ? s.face_slot2 : s.face_slot1)[code >> 1] = k;
-  }
   for (Array1<double>* a : {&s.src_h, &s.src_P, &s.src_Q, &s.depth_correction}) a->assign(ne, 0.0);
   s.outflow_factor.assign(ne, 1.0);
   if (second) {
@@ -765,25 +761,31 @@ void BoundaryFaceTerms(const HdModule& hd, HdSolver& s, const Mesh& mesh, const 
   }
 }
 
-void CalcDerivativesOnlySW2D(HdModule& hd, HdSolver& s, const Mesh& mesh) {
+void CalcDerivativesOnlySW2D(HdModule& hd, HdSolver& s, const Mesh& mesh, Array1<double>* dhdt,
+                             Array1<double>* dPdt, Array1<double>* dQdt) {
   // Face terms, then the element sums in local face order divided by the area.
-  HdState& st = hd.state;
   const FaceLoopInput in = GatherInput(hd, s, mesh);
   const int ne =
       mesh.elements.nelements_int > 0 ? mesh.elements.nelements_int : mesh.elements.nelements;
   const int* start = s.element_face_start.data();
   const HdSolver::SideTerms* terms = s.side_terms.data();
   const double* area = mesh.elements.area.data();
+  const bool sums = dhdt != nullptr && dPdt != nullptr && dQdt != nullptr;
+  if (sums) {
+    for (Array1<double>* a : {dhdt, dPdt, dQdt}) a->assign(mesh.elements.nelements, 0.0);
+  }
   VHD_OMP_PARALLEL {
     FaceTerms(hd, s, mesh, in);
-    VHD_OMP_FOR
-    for (int e = 1; e <= ne; ++e) {
-      double sh, sP, sQ;
-      ElementSums(terms, start, e, sh, sP, sQ);
-      const double inv = 1.0 / area[e];
-      st.dhdt[e] = sh * inv;
-      st.dPdt[e] = sP * inv;
-      st.dQdt[e] = sQ * inv;
+    if (sums) {
+      VHD_OMP_FOR
+      for (int e = 1; e <= ne; ++e) {
+        double sh, sP, sQ;
+        ElementSums(terms, start, e, sh, sP, sQ);
+        const double inv = 1.0 / area[e];
+        (*dhdt)[e] = sh * inv;
+        (*dPdt)[e] = sP * inv;
+        (*dQdt)[e] = sQ * inv;
+      }
     }
   }
 }
@@ -815,9 +817,6 @@ void CALCDERIVATIVESW2D(HdModule& hd, HdSolver& s, const Mesh& mesh, int stage, 
       ElementSums(terms, start, e, sh, sP, sQ);
       const double inv = 1.0 / area[e];
       const double dhdt = sh * inv, dPdt = sP * inv, dQdt = sQ * inv;
-      st.dhdt[e] = dhdt;
-      st.dPdt[e] = dPdt;
-      st.dQdt[e] = dQdt;
       const double P = st.P[e], Q = st.Q[e];  // state of the stage
       double hb, Pb, Qb;                      // base state of the step
       if (first_stage) {
@@ -892,9 +891,9 @@ void CALCVELOCITYFILTER2D(HdModule& hd, HdSolver& s, const Mesh& mesh) {
     if (!(st.wetdry[e] == kWet && st.h[e] > h_min)) continue;
     double w = s.filter_weight[e];
     double su = w * s.filter_u[e], sv = w * s.filter_v[e];
-    for (int k = s.element_face_start[e]; k < s.element_face_start[e + 1]; ++k) {
-      const int f = s.element_face_code[k] >> 1;
-      const int nb = (s.element_face_code[k] & 1) ? F.element1[f] : F.element2[f];
+    for (int j = 1; j <= ElementFaceCount(mesh.elements, e); ++j) {
+      const int f = ElementFace(mesh.elements, e, j);
+      const int nb = F.element1[f] == e ? F.element2[f] : F.element1[f];
       if (nb <= 0 || !qualifies(nb)) continue;
       const double wn = s.filter_weight[nb];
       w += wn;

@@ -14,8 +14,7 @@
 //
 // Inputs: HdState (eta, d, h, P, Q, wet/dry codes, cf, nu_t, velocity
 // gradients), the mesh geometry, the settings of HdSolutionTechnique and
-// h_min = mass_depth of HdFloodDry. Outputs: dhdt (m/s), dPdt, dQdt (m2/s2),
-// the face mass fluxes face_flux (m2/s) and face_flux_len (m3/s) of HdState
+// h_min = mass_depth of HdFloodDry. Outputs: the face mass fluxes face_flux (m2/s) and face_flux_len (m3/s) of HdState
 // (positive from element1 to element2) and the new h, eta, P, Q.
 //
 // Threads. The face loop writes each face's contributions into face arrays
@@ -88,9 +87,8 @@ struct HdSolver {
   Array1<int> interior_faces;
   Array1<BoundaryFaceRecord> boundary_faces;
 
-  // Per element: its faces in local order, encoded 2 * face + side (side 0:
-  // the element is element1, 1: element2), compressed rows.
-  Array1<int> element_face_start, element_face_code;
+  // Per element: the first of its face slots (below), compressed rows.
+  Array1<int> element_face_start;
 
   // Per face: the unit normal (ex, ey) and the length nn of the mesh normal
   // (nx = nn ex; nn is 1 on Cartesian meshes). (The face still water depth
@@ -98,7 +96,7 @@ struct HdSolver {
   Array1<double> face_ex, face_ey, face_nn;
 
   // Face terms of the current stage, one slot per element and face in the
-  // element's local face order (the rows of element_face_code), so that the
+  // element's local face order (rows element_face_start), so that the
   // element pass reads its slots one after the other: the water leaving the
   // element through the face (m3/s, negative when it enters) and the
   // momentum terms of that side (m4/s2). face_slot1/2 give the slots of the
@@ -153,9 +151,12 @@ void SetupSolverHD(HdModule& hd, const Mesh& mesh, HdSolver& solver);
 void CALCDERIVATIVESW2D(HdModule& hd, HdSolver& solver, const Mesh& mesh, int stage, double dt_stage,
                         bool last_stage);
 
-// Face and element sums only (no update): fills dhdt, dPdt, dQdt of the
-// current state. Used for the initial state and by tests of balance.
-void CalcDerivativesOnlySW2D(HdModule& hd, HdSolver& solver, const Mesh& mesh);
+// Face terms of the current state without an update (the face fluxes of the
+// initial state); with dhdt, dPdt, dQdt given, also the derivatives of every
+// owned element into them (allocated here; for checks of balance, not for
+// the time loop).
+void CalcDerivativesOnlySW2D(HdModule& hd, HdSolver& solver, const Mesh& mesh, Array1<double>* dhdt = nullptr,
+                             Array1<double>* dPdt = nullptr, Array1<double>* dQdt = nullptr);
 
 // Velocity filter after a stage (second order, type_of_filtering >= 1).
 void CALCVELOCITYFILTER2D(HdModule& hd, HdSolver& solver, const Mesh& mesh);

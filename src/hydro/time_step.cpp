@@ -132,7 +132,7 @@ void CHECKTIMESTEPHD(HdModule& hd, const Mesh& mesh, double dt) {
   }
 }
 
-void ReportCflViolations(std::string_view title, const Mesh& mesh, const Array1<double>& cfl,
+void ReportCflViolations(std::string_view title, const Mesh& mesh, const Array1<double>& cfl_rate,
                          const Array1<int>& code, const Array1<double>* still_depth,
                          const Array1<double>& length, double t, double dt, long long& count, int maximum,
                          int error_level) {
@@ -141,7 +141,8 @@ void ReportCflViolations(std::string_view title, const Mesh& mesh, const Array1<
   const double scale = geographic ? kRadToDeg : 1.0;
   bool violated = false;
   for (int e = 1; e <= ne; ++e) {
-    if (code[e] != kWet || !(cfl[e] > 1.00001)) continue;
+    const double cfl = CflNumber(cfl_rate[e], dt);
+    if (code[e] != kWet || !(cfl > 1.00001)) continue;
     violated = true;
     ++count;
     if (count <= maximum) {
@@ -149,7 +150,7 @@ void ReportCflViolations(std::string_view title, const Mesh& mesh, const Array1<
       WriteValueLine("time                  : %", t);
       WriteValueLine("time step interval    : %", dt);
       WriteValueLine("element number        : %", e);
-      WriteValueLine("CFL number            : %", cfl[e]);
+      WriteValueLine("CFL number            : %", cfl);
       WriteValueLine("x-coordinate (center) : %", mesh.elements.xc[e] * scale);
       WriteValueLine("y-coordinate (center) : %", mesh.elements.yc[e] * scale);
       if (still_depth) WriteValueLine("still water depth     : %", (*still_depth)[e]);
@@ -168,9 +169,7 @@ void InitialStepHD(HdModule& hd, HdSolver& solver, const Mesh& mesh) {
   for (int f = 1; f <= st.face_flux.size(); ++f) st.face_flux[f] = st.face_flux_len[f] = 0.0;
   // Boundary values at the first time of the run (both values of each pair).
   UpdateBoundaryValuesHD(hd, mesh, hd.time_axis.TimeOfStep(hd.time_axis.first_step));
-  if (hd.solution.scheme_of_space_discretization_horizontal == 2 || hd.eddy.horizontal.type > 0) {
-    UpdateGradientsHD(hd, solver, mesh);
-  }
+  if (hd.eddy.horizontal.type > 0) UpdateGradientsHD(hd, solver, mesh);
   CalcDerivativesOnlySW2D(hd, solver, mesh);
 }
 
@@ -187,15 +186,15 @@ void StepHD(HdModule& hd, HdSolver& solver, const Mesh& mesh, double t, double d
   // is violated.
   const int ne = st.nelements_owned;
   int violated = 0;
-  VHD_OMP_PARALLEL_FOR_REDUCTION(max, violated)
+  VHD_OMP_PARALLEL_FOR_SIMD_REDUCTION(max, violated)
   for (int e = 1; e <= ne; ++e) {
-    const double cfl = st.cfl_rate[e] >= 0 ? st.cfl_rate[e] * dt : kCflFloor;
-    st.cfl[e] = cfl;
-    if (cfl > 1.00001 && st.wetdry[e] == kWet) violated = 1;
+    const bool over = (CflNumber(st.cfl_rate[e], dt) > 1.00001) & (st.wetdry[e] == kWet);
+    violated = std::max(violated, over ? 1 : 0);
   }
   if (violated) {
-    ReportCflViolations("CFL condition violated in HD calculation", mesh, st.cfl, st.wetdry, &st.d, st.length, t, dt,
-                        hd.n_cfl_violations, hd.time_step.maximum_number_of_errors, hd.time_step.error_level);
+    ReportCflViolations("CFL condition violated in HD calculation", mesh, st.cfl_rate, st.wetdry, &st.d, st.length,
+                        t, dt, hd.n_cfl_violations, hd.time_step.maximum_number_of_errors,
+                        hd.time_step.error_level);
   }
   const double t_new = t + dt;
 

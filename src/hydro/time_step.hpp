@@ -31,6 +31,10 @@ namespace vhd {
 // constant, as held in double).
 inline constexpr double kCflFloor = static_cast<double>(1.0e-35f);
 
+// CFL number of an element of rate r (1/s, negative where not formed) over a
+// step dt.
+inline double CflNumber(double rate, double dt) { return rate >= 0 ? rate * dt : kCflFloor; }
+
 // CFL rates of the current state into state.cfl_rate (1/s; -1 where the
 // element is not wet or has no depth); returns the largest rate (0 when none
 // is positive).
@@ -54,14 +58,14 @@ double SplitTimeStepHD(double dt_cfl, double remainder);
 // set to 0 when that is not positive.
 void CHECKTIMESTEPHD(HdModule& hd, const Mesh& mesh, double dt);
 
-// CFL-violation report of one module: every wet element with cfl > 1.00001
-// increments count; while count <= maximum a warning block names the
+// CFL-violation report of one module: every wet element whose CFL number
+// (CflNumber of its rate cfl_rate over dt) exceeds 1.00001 increments count; while count <= maximum a warning block names the
 // element; the line on the maximum is written once, when count reaches it.
 // error_level 1 stops the run once count exceeds maximum, 2 at the first
 // violation. still_depth may be null (no depth line); length is the element
 // length of the rate (the "length" line). title is the block's
 // first line ("CFL condition violated in HD calculation").
-void ReportCflViolations(std::string_view title, const Mesh& mesh, const Array1<double>& cfl,
+void ReportCflViolations(std::string_view title, const Mesh& mesh, const Array1<double>& cfl_rate,
                          const Array1<int>& code, const Array1<double>* still_depth,
                          const Array1<double>& length, double t, double dt, long long& count, int maximum,
                          int error_level);

@@ -8,6 +8,7 @@
 #include "io/units.hpp"
 #include "log/log.hpp"
 #include "mesh/cartography.hpp"
+#include "hydro/time_step.hpp"
 #include "output/data_merge.hpp"
 #include "parallel/message_passing.hpp"
 
@@ -254,7 +255,7 @@ void HdItemValues(const HdOutputs& out, const HdModule& hd, const Mesh& mesh, in
       case kHdPFlux: v = s.P[e]; break;
       case kHdQFlux: v = s.Q[e]; break;
       case kHdWetDryCode: v = s.wetdry[e]; break;
-      case kHdCflNumber: v = s.cfl[e]; break;
+      case kHdCflNumber: v = CflNumber(s.cfl_rate[e], hd.dt_last); break;
       case kHdBedShearStress: v = std::sqrt(s.tau_x[e] * s.tau_x[e] + s.tau_y[e] * s.tau_y[e]); break;
       case kHdBedShearStressX: v = s.tau_x[e]; break;
       case kHdBedShearStressY: v = s.tau_y[e]; break;

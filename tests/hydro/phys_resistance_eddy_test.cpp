@@ -246,6 +246,7 @@ struct Smagorinsky : Field {
   Smagorinsky() {
     hd.eddy.horizontal.type = kEddySmagorinsky;
     hd.eddy.horizontal.value.values.assign(hd.state.nelements, 0.28);
+    AllocateVelocityGradientsHD(hd.state);
   }
 };
 
@@ -289,8 +290,8 @@ TEST(EddyViscosity, GeographicAreaIsScaledToSquareMetres) {
   HdModule hd;
   hd.projection = 2;
   hd.metric_radius = kPhysical.earth_radius;
-  AllocateStateHD(hd, mesh);
   hd.eddy.horizontal.type = kEddySmagorinsky;
+  AllocateStateHD(hd, mesh);
   hd.eddy.horizontal.value.values.assign(hd.state.nelements, 0.28);
   hd.state.ux[1] = 0.01 / std::sqrt(2.0);
   CALCEDDYVISCOSITYHD(hd, mesh);

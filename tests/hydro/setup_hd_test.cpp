@@ -69,9 +69,11 @@ TEST(SetupHD, DefaultsOfAMinimalSetup) {
   for (int e = 1; e <= 12; ++e) {
     EXPECT_EQ(hd.state.wetdry[e], kWet);
     EXPECT_DOUBLE_EQ(hd.state.d[e], 2.0);
-    EXPECT_EQ(hd.state.cos_lat[e], 1.0);
-    EXPECT_EQ(hd.state.tan_lat[e], 0.0);
   }
+  // No metric factors on a Cartesian mesh; velocity gradients only with eddy
+  // viscosity.
+  EXPECT_TRUE(hd.state.cos_lat.empty() && hd.state.tan_lat.empty());
+  EXPECT_EQ(hd.state.ux.empty(), hd.eddy.horizontal.type == 0);
   EXPECT_EQ(hd.timing.name, "Hydrodynamics");
 }
 
