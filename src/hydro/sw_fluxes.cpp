@@ -314,21 +314,32 @@ void InteriorFaceTerms(const FaceLoopInput& in, HdSolver& s, double* face_flux, 
   }
 }
 
-// One interior face, every case: classification, face values, flux and the
-// signed contributions of each side. Faces without a wet side return before
-// any arithmetic.
+// Face values l, r of interior face f and whether it fell back to first
+// order (FaceSideValues); false for a face without a wet side, whose terms
+// are set to zero before any arithmetic.
 template <bool kSecond>
-inline void InteriorFace(const FaceLoopInput& in, HdSolver& s, double* face_flux, double* face_flux_len, int f,
-                         double theta = 1.0) {
+inline bool WetFaceValues(const FaceLoopInput& in, HdSolver& s, double* face_flux, double* face_flux_len, int f,
+                          SideValues& l, SideValues& r, bool& first) {
   const int L = in.e1[f], R = in.e2[f];
   if (in.code[L] != kWet && in.code[R] != kWet) {  // dry-dry (or flooded) faces carry nothing
     ZeroFace(s, f);
     face_flux[f] = face_flux_len[f] = 0.0;
-    return;
+    return false;
   }
-  SideValues l{in.eta[L], in.P[L], in.Q[L], in.d[L], in.h[L]};
-  SideValues r{in.eta[R], in.P[R], in.Q[R], in.d[R], in.h[R]};
-  const bool first = FaceSideValues<kSecond>(in, f, L, R, l, r);
+  l = {in.eta[L], in.P[L], in.Q[L], in.d[L], in.h[L]};
+  r = {in.eta[R], in.P[R], in.Q[R], in.d[R], in.h[R]};
+  first = FaceSideValues<kSecond>(in, f, L, R, l, r);
+  return true;
+}
+
+// One interior face, every case: classification, face values, flux and the
+// signed contributions of each side.
+template <bool kSecond>
+inline void InteriorFace(const FaceLoopInput& in, HdSolver& s, double* face_flux, double* face_flux_len, int f,
+                         double theta = 1.0) {
+  SideValues l, r;
+  bool first;
+  if (!WetFaceValues<kSecond>(in, s, face_flux, face_flux_len, f, l, r, first)) return;
   InteriorFaceTerms<kSecond>(in, s, face_flux, face_flux_len, f, l, r, first, theta);
 }
 
@@ -442,17 +453,11 @@ void InteriorFaceChunk(const FaceLoopInput& in, HdSolver& s, double* face_flux, 
   b.n = 0;
   for (int i = first_index; i <= last_index; ++i) {
     const int f = faces[i];
+    SideValues l, r;
+    bool first;
+    if (!WetFaceValues<kSecond>(in, s, face_flux, face_flux_len, f, l, r, first)) continue;
     const int L = in.e1[f], R = in.e2[f];
-    const int cL = in.code[L], cR = in.code[R];
-    if (cL != kWet && cR != kWet) {  // dry-dry (or flooded) faces carry nothing
-      ZeroFace(s, f);
-      face_flux[f] = face_flux_len[f] = 0.0;
-      continue;
-    }
-    SideValues l{in.eta[L], in.P[L], in.Q[L], in.d[L], in.h[L]};
-    SideValues r{in.eta[R], in.P[R], in.Q[R], in.d[R], in.h[R]};
-    const bool first = FaceSideValues<kSecond>(in, f, L, R, l, r);
-    const bool plain = cL == kWet && cR == kWet && l.h >= in.h_move && r.h >= in.h_move &&
+    const bool plain = in.code[L] == kWet && in.code[R] == kWet && l.h >= in.h_move && r.h >= in.h_move &&
                        l.h > riemann_detail::kDryDepth && r.h > riemann_detail::kDryDepth;
     if (plain) {
       AddWetFace<kSecond>(in, b, f, L, R, l, r, first);
