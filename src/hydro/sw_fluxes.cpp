@@ -400,7 +400,8 @@ inline void AddWetFace(const FaceLoopInput& in, WetFaceBatch& b, int f, int L, i
 }
 
 // Fluxes and side contributions of the plain wet faces of a batch, the
-// solver type fixed at compile time.
+// solver type fixed at compile time. (A function of its own: inlined into the
+// chunk loop, the compiler no longer turns this loop into vector code.)
 template <int kSolver, bool kSecond>
 [[gnu::noinline]] void WetFaceKernel(const FaceLoopInput& in, WetFaceBatch& b) {
   const int n = b.n;

@@ -17,13 +17,16 @@
 // h_min = mass_depth of HdFloodDry. Outputs: the face mass fluxes face_flux (m2/s) and face_flux_len (m3/s) of HdState
 // (positive from element1 to element2) and the new h, eta, P, Q.
 //
-// Threads. The face loop writes each face's contributions into face arrays
-// (one slot per side); the element loop then sums them per element over the
-// element's faces in its local face order. No two threads ever add to one
-// element, and the order of additions is fixed, so results are the same to
-// the last bit for any thread count.
+// Threads. The face loop writes each face's contributions into two slots,
+// one per side, held per element in the element's local face order; the
+// element loop then sums each element's slots in that order. No two threads
+// ever add to one element, and the order of additions is fixed, so results
+// are the same to the last bit for any thread count. The face loop takes the
+// faces in chunks: faces with two wet sides deep enough ("plain wet faces")
+// have their flux evaluated side by side in vector lanes, by the same inline
+// code as the scalar path of every other face.
 //
-// Settings interpreted here where the product leaves them open:
+// Choices made here:
 //   - face_value_limiter > 0 clips each reconstructed face value of eta, P, Q
 //     to the range of the two element-centre values across the face;
 //   - with second order, each face velocity component is bounded by the
