@@ -80,9 +80,9 @@ struct HdState {
   Array1<int> wetdry_old;         // code before the last flood/dry check
   Array1<double> length;          // characteristic length for the CFL number (m)
 
-  // State at the start of the HD step, U(n): the base of every stage of the
-  // one- and two-stage schemes (the working arrays h, P, Q hold U* between
-  // the stages).
+  // State at the start of the HD step, U(n): the base of the second stage of
+  // the two-stage scheme (the working arrays h, P, Q hold U* between the
+  // stages; a one-stage step does not store it).
   Array1<double> h_old, P_old, Q_old;
 
   // Velocity gradients of the element (1/s, metric factors applied on

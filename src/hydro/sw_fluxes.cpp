@@ -800,8 +800,8 @@ void CALCDERIVATIVESW2D(HdModule& hd, HdSolver& s, const Mesh& mesh, int stage, 
                         bool last_stage) {
   // Face terms, then the derivatives and the element update of the stage in
   // one pass over the elements, all in one parallel region. The first stage
-  // takes the current state as the base of the step and keeps it in h_old,
-  // P_old, Q_old for the later stages.
+  // takes the current state as the base of the step and, when more stages
+  // follow, keeps it in h_old, P_old, Q_old for them.
   HdState& st = hd.state;
   const FaceLoopInput in = GatherInput(hd, s, mesh);
   const int ne =
@@ -826,9 +826,12 @@ void CALCDERIVATIVESW2D(HdModule& hd, HdSolver& s, const Mesh& mesh, int stage, 
       const double P = st.P[e], Q = st.Q[e];  // state of the stage
       double hb, Pb, Qb;                      // base state of the step
       if (first_stage) {
-        hb = st.h_old[e] = st.h[e];
-        Pb = st.P_old[e] = P;
-        Qb = st.Q_old[e] = Q;
+        hb = st.h[e], Pb = P, Qb = Q;
+        if (!last_stage) {  // kept for the later stages
+          st.h_old[e] = hb;
+          st.P_old[e] = Pb;
+          st.Q_old[e] = Qb;
+        }
       } else {
         hb = st.h_old[e];
         Pb = st.P_old[e];

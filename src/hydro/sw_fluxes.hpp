@@ -148,8 +148,8 @@ void SetupSolverHD(HdModule& hd, const Mesh& mesh, HdSolver& solver);
 
 // Derivatives of one stage and the element update, in one pass over the
 // elements after the face loops. Stage 1 takes the current state as the base
-// of the step and stores it in h_old, P_old, Q_old; later stages advance from
-// that base. dt_stage is the stage step (s); last_stage is true for the final
+// of the step and, when more stages follow, stores it in h_old, P_old, Q_old;
+// later stages advance from that base. dt_stage is the stage step (s); last_stage is true for the final
 // stage of the step (the depth is cut at 0 after every other stage).
 void CALCDERIVATIVESW2D(HdModule& hd, HdSolver& solver, const Mesh& mesh, int stage, double dt_stage,
                         bool last_stage);
