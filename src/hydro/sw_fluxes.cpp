@@ -460,7 +460,7 @@ void InteriorFaceChunk(const FaceLoopInput& in, HdSolver& s, double* face_flux, 
     const int L = in.e1[f], R = in.e2[f];
     const bool plain = in.code[L] == kWet && in.code[R] == kWet && l.h >= in.h_move && r.h >= in.h_move &&
                        l.h > riemann_detail::kDryDepth && r.h > riemann_detail::kDryDepth;
-    if (plain) {
+    if (plain && s.vector_faces) {
       AddWetFace<kSecond>(in, b, f, L, R, l, r, first);
     } else {
       InteriorFaceTerms<kSecond>(in, s, face_flux, face_flux_len, f, l, r, first, 1.0);

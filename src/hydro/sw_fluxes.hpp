@@ -140,6 +140,9 @@ struct HdSolver {
   int implicit_gravity = 0;
   // Threshold of the Barth-Jespersen limiter (same unit as the variable).
   double limiter_epsilon = 1e-12;
+  // Plain wet faces take the batched path in vector lanes; false sends every
+  // face through the scalar path, which gives the same bits (for checks).
+  bool vector_faces = true;
 };
 
 // Builds the solver tables for the velocity mesh of the module; allocates

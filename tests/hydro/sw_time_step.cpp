@@ -75,7 +75,16 @@ TEST(SwTimeStep, CflCorrectionLimitsTheSpeed) {
 // A closed basin with a sloshing surface, flooding and drying on over a
 // sloping beach: the volume changes only by the booked mass correction, and
 // 1 and 2 threads give the same bits.
-void RunBasin(int threads, std::vector<double>& h, double& volume0, double& volume1, double& correction) {
+struct BasinRun {
+  int threads = 1;
+  int solver = 1;
+  bool vector_faces = true;  // plain wet faces in vector lanes
+  bool eddy = false;         // constant eddy viscosity
+};
+
+// Returns the number of steps.
+long long RunBasin(const BasinRun& run, std::vector<double>& h, double& volume0, double& volume1,
+                   double& correction) {
   SwCase c;
   RectangleMeshSpec spec;
   spec.nx = 24;
@@ -86,28 +95,50 @@ void RunBasin(int threads, std::vector<double>& h, double& volume0, double& volu
   spec.seed = 9;
   spec.bed = [](double x, double) { return -0.3 + 0.25 * x; };
   MakeCase(c, spec, 0.01);
-  SetScheme(c.hd, 1, 2);
+  SetScheme(c.hd, run.solver, 2);
   SetFloodDry(c.hd, 0.002, 0.005, 0.01);
   c.hd.time_step.dt_max_HD = 0.005;
-  OmpSetThreads(threads);
+  if (run.eddy) {
+    c.hd.eddy.horizontal.type = kEddyConstant;
+    c.hd.eddy.horizontal.value.values.assign(c.hd.state.nelements, 0.01);
+    AllocateVelocityGradientsHD(c.hd.state);
+  }
+  c.solver.vector_faces = run.vector_faces;
+  OmpSetThreads(run.threads);
   StartCase(c, [](double x, double y) { return 0.05 * std::cos(3.14159 * x / 2) + 0.01 * y; });
   volume0 = Volume(c);
   RunTo(c, 5.0);
-  EXPECT_EQ(c.hd.n_steps, 1000);
   volume1 = Volume(c);
   correction = c.hd.flood_dry.mass_correction;
   h.assign(c.hd.state.h.begin(), c.hd.state.h.end());
   OmpSetThreads(1);
+  return c.hd.n_steps;
 }
 
 TEST(SwTimeStep, ClosedBasinConservesVolumeAndThreadsAgreeBitwise) {
   std::vector<double> h1, h2;
   double v0, v1, corr, w0, w1, corr2;
-  RunBasin(1, h1, v0, v1, corr);
+  EXPECT_EQ(RunBasin({.threads = 1}, h1, v0, v1, corr), 1000);
   EXPECT_LT(std::abs(v1 - corr - v0), 1e-12 * v0) << "mass correction " << corr;
-  RunBasin(2, h2, w0, w1, corr2);
+  RunBasin({.threads = 2}, h2, w0, w1, corr2);
   ASSERT_EQ(h1.size(), h2.size());
   EXPECT_EQ(std::memcmp(h1.data(), h2.data(), h1.size() * sizeof(double)), 0);
+}
+
+// The faces evaluated side by side in vector lanes give the bits of the
+// scalar path, for every solver, with and without eddy viscosity.
+TEST(SwTimeStep, VectorAndScalarFacePathsAgreeBitwise) {
+  for (int solver = 0; solver <= 4; ++solver) {
+    for (bool eddy : {false, true}) {
+      SCOPED_TRACE(testing::Message() << "solver " << solver << " eddy " << eddy);
+      std::vector<double> h1, h2;
+      double v0, v1, corr;
+      RunBasin({.solver = solver, .vector_faces = true, .eddy = eddy}, h1, v0, v1, corr);
+      RunBasin({.solver = solver, .vector_faces = false, .eddy = eddy}, h2, v0, v1, corr);
+      ASSERT_EQ(h1.size(), h2.size());
+      EXPECT_EQ(std::memcmp(h1.data(), h2.data(), h1.size() * sizeof(double)), 0);
+    }
+  }
 }
 
 }  // namespace
