@@ -318,7 +318,7 @@ void InteriorFaceTerms(const FaceLoopInput& in, HdSolver& s, double* face_flux, 
 // order (FaceSideValues); false for a face without a wet side, whose terms
 // are set to zero before any arithmetic.
 template <bool kSecond>
-inline bool WetFaceValues(const FaceLoopInput& in, HdSolver& s, double* face_flux, double* face_flux_len, int f,
+[[gnu::always_inline]] inline bool WetFaceValues(const FaceLoopInput& in, HdSolver& s, double* face_flux, double* face_flux_len, int f,
                           SideValues& l, SideValues& r, bool& first) {
   const int L = in.e1[f], R = in.e2[f];
   if (in.code[L] != kWet && in.code[R] != kWet) {  // dry-dry (or flooded) faces carry nothing
