@@ -125,17 +125,7 @@ void CyclicFace(HdModule& hd, HdSolver& s, const Mesh& mesh, const BoundaryFaceR
     return;
   }
   const bool second = hd.solution.scheme_of_space_discretization_horizontal == 2;
-  bool riemann;
-  if (cc == kWet && cp == kWet) {
-    riemann = true;
-  } else if (cc == kWet && cp == kFlooded) {
-    riemann = second || st.eta[c] + st.d[p] > 0;
-  } else if (cc == kFlooded && cp == kWet) {
-    riemann = second || st.d[c] + st.eta[p] > 0;
-  } else {
-    riemann = false;
-  }
-  if (!riemann) {
+  if (!RiemannFaceCase(cc, cp, st.eta[c], st.d[c], st.eta[p], st.d[p], second)) {
     if (cc == kWet) {
       BoundaryFaceRecord wall = rec;
       wall.kind = kBoundaryLand;

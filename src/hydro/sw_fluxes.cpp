@@ -93,6 +93,37 @@ void EddyFlux(double nu, double hf, double ux, double uy, double vx, double vy, 
   Dy = hf * nu * (shear * nx + 2.0 * vy * ny) * len;
 }
 
+// Momentum terms of wet element e against a wall (a land face, or a dry
+// neighbour) from its face values side: no mass flux, the pressure of the
+// wall depth and the bed-slope term, both with the side's face d (at rest
+// the wall depth is the side's face depth, and the two cancel at any level),
+// less the eddy stress of the element's own values. (ox, oy) is the unit
+// normal out of the element, nn the length of the mesh normal and nlen that
+// length times the face length.
+inline void WallTerms(const FaceLoopInput& in, int e, const SideValues& side, double ox, double oy, double nn,
+                      double nlen, double& mx, double& my) {
+  const double g = in.g, hs = side.h, k = in.k[e];
+  const double un = (hs >= in.h_min && hs > 0) ? (side.P * ox + side.Q * oy) * nn / hs : 0.0;
+  const double hw = WallDepth(in.land_condition, un, hs, k, g);
+  const double pw = 0.5 * g * (hw * hw - side.d * side.d) * nlen;
+  const double b = g * (in.eta[e] + k) * side.d * nlen;
+  double Dx = 0.0, Dy = 0.0;
+  if (in.eddy) EddyFlux(in.nu[e], hs, in.ux[e], in.uy[e], in.vx[e], in.vy[e], ox, oy, nlen, Dx, Dy);
+  mx = -(pw * ox - Dx) + b * ox;
+  my = -(pw * oy - Dy) + b * oy;
+}
+
+// Terms of a land boundary face f of wet element e (its element1): first
+// order at closed walls.
+void LandFaceTerms(const FaceLoopInput& in, HdSolver& s, int f, int e) {
+  SideValues side{in.eta[e], in.P[e], in.Q[e], in.d[e], in.h[e]};
+  if (in.fad != 0) FaceDepth(side, in.face_d[f]);
+  const double nn = in.nn[f];
+  double mx, my;
+  WallTerms(in, e, side, in.ex[f], in.ey[f], nn, nn * in.len[f], mx, my);
+  SetBoundaryFaceTerms(s, f, 0.0, mx, my);
+}
+
 // Velocity (m/s) with which water leaving element e carries momentum: its
 // centre velocity when it is wet and at least h_move deep, else 0 (flooded
 // elements count as at rest, as in the fluxes).
@@ -197,16 +228,7 @@ void InteriorFaceTerms(const FaceLoopInput& in, HdSolver& s, double* face_flux, 
   const double ex = in.ex[f], ey = in.ey[f], nn = in.nn[f];
   const double nlen = nn * in.len[f];  // length of the normal times the face length
 
-  bool riemann;
-  if (cL == kWet && cR == kWet) {
-    riemann = true;
-  } else if (cL == kWet && cR == kFlooded) {
-    riemann = kSecond || etaL + in.d[R] > 0;
-  } else if (cL == kFlooded && cR == kWet) {
-    riemann = kSecond || in.d[L] + etaR > 0;
-  } else {
-    riemann = false;  // wet against dry: land treatment of the wet side
-  }
+  const bool riemann = RiemannFaceCase(cL, cR, etaL, in.d[L], etaR, in.d[R], kSecond);
   const double kL = in.k[L], kR = in.k[R];
   const double g = in.g;
   double Dx = 0.0, Dy = 0.0;
@@ -291,26 +313,15 @@ void InteriorFaceTerms(const FaceLoopInput& in, HdSolver& s, double* face_flux, 
     return;
   }
 
-  // Land treatment of the wet side: no mass flux, the wall pressure and the
-  // bed-slope term, both with the side's own face d (at rest the wall depth
-  // is the side's face depth, and the two cancel at any level).
+  // Land treatment of the wet side.
   face_flux[f] = face_flux_len[f] = 0.0;
+  double mx, my;
   if (cL == kWet) {
-    const double hs = l.h;
-    const double un = (hs >= in.h_min && hs > 0) ? (l.P * ex + l.Q * ey) * nn / hs : 0.0;
-    const double hw = WallDepth(in.land_condition, un, hs, kL, g);
-    const double pw = 0.5 * g * (hw * hw - l.d * l.d) * nlen;
-    const double bL = g * (etaL + kL) * l.d * nlen;
-    if (in.eddy) EddyFlux(in.nu[L], hs, in.ux[L], in.uy[L], in.vx[L], in.vy[L], ex, ey, nlen, Dx, Dy);
-    SetFaceTerms(s, f, 0.0, -(pw * ex - Dx) + bL * ex, -(pw * ey - Dy) + bL * ey, 0.0, 0.0);
+    WallTerms(in, L, l, ex, ey, nn, nlen, mx, my);
+    SetFaceTerms(s, f, 0.0, mx, my, 0.0, 0.0);
   } else {
-    const double hs = r.h;
-    const double un = (hs >= in.h_min && hs > 0) ? -(r.P * ex + r.Q * ey) * nn / hs : 0.0;
-    const double hw = WallDepth(in.land_condition, un, hs, kR, g);
-    const double pw = 0.5 * g * (hw * hw - r.d * r.d) * nlen;
-    const double bR = g * (etaR + kR) * r.d * nlen;
-    if (in.eddy) EddyFlux(in.nu[R], hs, in.ux[R], in.uy[R], in.vx[R], in.vy[R], ex, ey, nlen, Dx, Dy);
-    SetFaceTerms(s, f, 0.0, 0.0, 0.0, (pw * ex - Dx) - bR * ex, (pw * ey - Dy) - bR * ey);
+    WallTerms(in, R, r, -ex, -ey, nn, nlen, mx, my);
+    SetFaceTerms(s, f, 0.0, 0.0, 0.0, mx, my);
   }
 }
 
@@ -557,7 +568,7 @@ void FaceTerms(HdModule& hd, HdSolver& s, const Mesh& mesh, const FaceLoopInput&
     }
     st.face_flux[rec.face] = st.face_flux_len[rec.face] = 0.0;
     if (st.wetdry[rec.element] == kWet) {
-      BoundaryFaceTerms(hd, s, mesh, rec);
+      LandFaceTerms(in, s, rec.face, rec.element);
     } else {
       SetBoundaryFaceTerms(s, rec.face, 0.0, 0.0, 0.0);
     }
@@ -738,33 +749,7 @@ void SetupSolverHD(HdModule& hd, const Mesh& mesh, HdSolver& s) {
 }
 
 void BoundaryFaceTerms(const HdModule& hd, HdSolver& s, const Mesh& mesh, const BoundaryFaceRecord& rec) {
-  const HdState& st = hd.state;
-  const HdSolutionTechnique& sol = hd.solution;
-  const int f = rec.face, c = rec.element;
-  const double g = kPhysical.g;
-  const double nx = mesh.faces.nx[f], ny = mesh.faces.ny[f], len = mesh.faces.length[f];
-  const double df = st.face_d[f];
-  const double k = s.depth_correction[c];
-  // Face values of the inner element: first order at closed walls.
-  SideValues side{st.eta[c], st.P[c], st.Q[c], st.d[c], st.h[c]};
-  if (sol.face_average_d != 0) FaceDepth(side, df);
-  const double hs = side.h, ds = side.d;
-  const double h_min = hd.flood_dry.mass_depth;
-  switch (rec.kind) {
-    case kBoundaryLand:
-    default: {
-      const double un = (hs >= h_min && hs > 0) ? (st.P[c] * nx + st.Q[c] * ny) / hs : 0.0;
-      const double hw = WallDepth(sol.type_of_land_condition, un, hs, k, g);
-      const double pw = 0.5 * g * (hw * hw - ds * ds) * len;
-      double Dx = 0.0, Dy = 0.0;
-      if (hd.eddy.horizontal.type > 0) {
-        EddyFlux(st.nu_t[c], hs, st.ux[c], st.uy[c], st.vx[c], st.vy[c], nx, ny, len, Dx, Dy);
-      }
-      const double b = g * (st.eta[c] + k) * ds * len;
-      SetBoundaryFaceTerms(s, f, 0.0, -(pw * nx - Dx) + b * nx, -(pw * ny - Dy) + b * ny);
-      break;
-    }
-  }
+  LandFaceTerms(GatherInput(hd, s, mesh), s, rec.face, rec.element);
 }
 
 void CalcDerivativesOnlySW2D(HdModule& hd, HdSolver& s, const Mesh& mesh, Array1<double>* dhdt,

@@ -167,6 +167,19 @@ void CalcDerivativesOnlySW2D(HdModule& hd, HdSolver& solver, const Mesh& mesh, A
 // Velocity filter after a stage (second order, type_of_filtering >= 1).
 void CALCVELOCITYFILTER2D(HdModule& hd, HdSolver& solver, const Mesh& mesh);
 
+// Whether a face between elements of wet/dry codes cL, cR (centre surface
+// eta and still water depth d of each) takes the Riemann flux: two wet sides
+// always; a wet and a flooded side with second order, or when the wet side's
+// surface lies above the flooded side's bed; otherwise (wet against dry) the
+// wet side sees a wall. Faces without a wet side carry nothing and are not
+// asked.
+inline bool RiemannFaceCase(int cL, int cR, double etaL, double dL, double etaR, double dR, bool second) {
+  if (cL == kWet && cR == kWet) return true;
+  if (cL == kWet && cR == kFlooded) return second || etaL + dR > 0;
+  if (cL == kFlooded && cR == kWet) return second || dL + etaR > 0;
+  return false;
+}
+
 // Terms of face f for both sides: mass flux (m3/s, positive from element1 to
 // element2) and the momentum terms of each side.
 inline void SetFaceTerms(HdSolver& s, int f, double mass, double mx1, double my1, double mx2, double my2) {
@@ -179,9 +192,10 @@ inline void SetBoundaryFaceTerms(HdSolver& s, int f, double mass, double mx, dou
   s.side_terms[s.face_slot1[f]] = {mass, mx, my};
 }
 
-// Contributions of one boundary face from its prepared record: fills the
-// slot of its inner side (element1) with SetBoundaryFaceTerms. The inner element must be
-// wet; land faces get the wall pressure and the bed-slope term.
+// Terms of a boundary face closed as land (the record's face and inner
+// element1, which must be wet): the wall pressure and the bed-slope term into
+// the slot of the inner side. For faces outside the face loop (a cyclic face
+// whose partner is dry); the face loop forms its land faces itself.
 void BoundaryFaceTerms(const HdModule& hd, HdSolver& solver, const Mesh& mesh,
                        const BoundaryFaceRecord& record);
 
