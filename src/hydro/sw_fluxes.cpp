@@ -1,6 +1,8 @@
 #include "hydro/sw_fluxes.hpp"
 
 #include <algorithm>
+#include <array>
+#include <type_traits>
 #include <cmath>
 #include <limits>
 #include <numbers>
@@ -575,14 +577,28 @@ void FaceTerms(HdModule& hd, HdSolver& s, const Mesh& mesh, const FaceLoopInput&
   }
 }
 
-// Sums of the face terms of element e in its local face order.
-inline void ElementSums(const HdSolver::SideTerms* terms, const int* start, int e, double& sh, double& sP,
-                        double& sQ) {
+// Sums of the face terms of element e in its local face order (slots of the
+// planes, kPlanes of them; a slot beyond the element's faces adds zero).
+template <int kPlanes>
+[[gnu::always_inline]] inline void ElementSums(const HdSolver::SideTerms* terms, int stride, int e, double& sh,
+                                               double& sP, double& sQ) {
   sh = sP = sQ = 0.0;
-  for (int k = start[e]; k < start[e + 1]; ++k) {
-    sh -= terms[k].out;
-    sP += terms[k].mx;
-    sQ += terms[k].my;
+  for (int j = 0; j < kPlanes; ++j) {
+    const HdSolver::SideTerms& t = terms[j * stride + e];
+    sh -= t.out;
+    sP += t.mx;
+    sQ += t.my;
+  }
+}
+
+// Calls fn with std::integral_constant<int, planes> for the face planes of
+// the solver (3: triangles only; 4: quadrilaterals present).
+template <typename Fn>
+void ForFacePlanes(const HdSolver& s, Fn&& fn) {
+  if (s.face_planes == 3) {
+    fn(std::integral_constant<int, 3>{});
+  } else {
+    fn(std::integral_constant<int, 4>{});
   }
 }
 
@@ -600,24 +616,24 @@ inline void ElementSums(const HdSolver::SideTerms* terms, const int* start, int 
 // Returns the number of limited elements.
 int OutflowFactorsHD(HdModule& hd, HdSolver& s, const Mesh& mesh, int ne, bool first_stage, double dt) {
   const HdState& st = hd.state;
-  const int* start = s.element_face_start.data();
   const HdSolver::SideTerms* terms = s.side_terms.data();
+  const int stride = s.plane_stride;
   const double* area = mesh.elements.area.data();
   const double* hbase = first_stage ? st.h.data() : st.h_old.data();
+  const double* src_h = s.src_h.data();
   double* factor = s.outflow_factor.data();
   int nlimited = 0;
-  VHD_OMP_PARALLEL_FOR_REDUCTION(+, nlimited)
-  for (int e = 1; e <= ne; ++e) {
-    double out = 0.0;
-    for (int k = start[e]; k < start[e + 1]; ++k) out += std::max(0.0, terms[k].out);
-    double theta = 1.0;
-    const double held = std::max(0.0, hbase[e] + dt * s.src_h[e]) * area[e];
-    if (dt * out > held) {
-      theta = held / (dt * out);
-      ++nlimited;
+  ForFacePlanes(s, [&](auto planes) {
+    VHD_OMP_PARALLEL_FOR_SIMD_REDUCTION(+, nlimited)
+    for (int e = 1; e <= ne; ++e) {
+      double out = 0.0;
+      for (int j = 0; j < planes; ++j) out += std::max(0.0, terms[j * stride + e].out);
+      const double held = std::max(0.0, hbase[e] + dt * src_h[e]) * area[e];
+      const bool limited = dt * out > held;
+      factor[e] = limited ? held / (dt * out) : 1.0;
+      nlimited += limited ? 1 : 0;
     }
-    factor[e] = theta;
-  }
+  });
   return nlimited;
 }
 
@@ -650,6 +666,91 @@ void LimitOutflowHD(HdModule& hd, HdSolver& s, const Mesh& mesh, const FaceLoopI
       const double theta = factor[rec.element];
       if (theta < 1.0) BoundaryFaceFluxHD(hd, s, mesh, rec, theta);
     }
+  }
+}
+
+// Element update of a stage, in vector lanes (selects, no branches):
+//   h = h_b + dt (dh/dt + s_h),
+// and for wet elements P = P_b + dt' (dP/dt + s_P) with dt' = dt times the
+// shallow-water damping sin((h - h_min) pi/2 / h_min) below 2 h_min (option
+// 1), then the semi-implicit drag; elements that are not wet take the plain
+// update (their face terms carry only what water brings in). kFirst: the
+// base state is the current one (kept in h_old, P_old, Q_old unless kLast);
+// else it is h_old, P_old, Q_old. The depth is cut at 0 after every stage but
+// the last. kIterate: the drag is formed a second time (discretisation 2).
+template <int kPlanes, bool kFirst, bool kLast, bool kIterate>
+void UpdateElementsHD(HdModule& hd, const HdSolver& s, const Mesh& mesh, int ne, double dt) {
+  HdState& st = hd.state;
+  const HdSolver::SideTerms* terms = s.side_terms.data();
+  const int stride = s.plane_stride;
+  const double* area = mesh.elements.area.data();
+  const int* code = st.wetdry.data();
+  const double* d = st.d.data();
+  const double* cf_bed = st.cf.data();
+  const double* cf_surface = st.cf_surface.data();
+  const double *src_h = s.src_h.data(), *src_P = s.src_P.data(), *src_Q = s.src_Q.data();
+  double *h = st.h.data(), *eta = st.eta.data(), *P = st.P.data(), *Q = st.Q.data();
+  double *h_old = st.h_old.data(), *P_old = st.P_old.data(), *Q_old = st.Q_old.data();
+  const double h_min = hd.flood_dry.mass_depth;
+  // Depth below which the update is damped (none without the option).
+  const double damped_below = s.shallow_depth_option == 1 ? 2.0 * h_min : -std::numeric_limits<double>::infinity();
+  const double drag_above = std::max(h_min, 0.0);
+  constexpr double half_pi = 0.5 * std::numbers::pi;
+  VHD_OMP_PARALLEL_FOR_SIMD
+  for (int e = 1; e <= ne; ++e) {
+    double sh, sP, sQ;
+    ElementSums<kPlanes>(terms, stride, e, sh, sP, sQ);
+    const double inv = 1.0 / area[e];
+    const double dhdt = sh * inv, dPdt = sP * inv, dQdt = sQ * inv;
+    const double Pe = P[e], Qe = Q[e];  // state of the stage
+    double hb, Pb, Qb;                  // base state of the step
+    if constexpr (kFirst) {
+      hb = h[e], Pb = Pe, Qb = Qe;
+      if constexpr (!kLast) {
+        h_old[e] = hb;
+        P_old[e] = Pb;
+        Q_old[e] = Qb;
+      }
+    } else {
+      hb = h_old[e], Pb = P_old[e], Qb = Q_old[e];
+    }
+    double hn = hb + dt * (dhdt + src_h[e]);
+
+    // Wet: damped explicit update, then the semi-implicit drag r = cf |u| / h
+    // with the velocity of the stage state over the new depth and (on
+    // request) once more with the velocity of the result.
+    const double damp =
+        hn >= damped_below ? 1.0 : hn > h_min ? QuarterWaveSine((hn - h_min) * half_pi / h_min) : 0.0;
+    const double dts = dt * damp;
+    const double Ps = Pb + dts * (dPdt + src_P[e]);
+    const double Qs = Qb + dts * (dQdt + src_Q[e]);
+    const double cf = cf_bed[e] + cf_surface[e];
+    const double ih = 1.0 / hn;
+    double u = Pe * ih, v = Qe * ih;
+    double damped = 1.0 / (1.0 + dts * cf * std::sqrt(u * u + v * v) * ih);
+    if constexpr (kIterate) {
+      u = Ps * damped * ih, v = Qs * damped * ih;
+      damped = 1.0 / (1.0 + dts * cf * std::sqrt(u * u + v * v) * ih);
+    }
+    const double drag = cf > 0 ? damped : 1.0;
+    double Pw = hn > drag_above ? Ps * drag : Ps;
+    double Qw = hn > drag_above ? Qs * drag : Qs;
+    // Not accelerated below h_min: the element keeps the velocity of the base
+    // state and its momentum follows its depth (a momentum held while the
+    // water drains away would fling it out ever faster).
+    const double scale = std::max(0.0, hn) / hb;
+    const double hold = damp == 0.0 ? hb : 0.0;
+    Pw = hold > 0 ? Pb * scale : Pw;
+    Qw = hold > 0 ? Qb * scale : Qw;
+
+    const bool wet = code[e] == kWet;
+    const double Pn = wet ? Pw : Pb + dt * dPdt;
+    const double Qn = wet ? Qw : Qb + dt * dQdt;
+    if constexpr (!kLast) hn = std::max(0.0, hn);
+    h[e] = hn;
+    eta[e] = hn - d[e];
+    P[e] = Pn;
+    Q[e] = Qn;
   }
 }
 
@@ -695,18 +796,22 @@ void SetupSolverHD(HdModule& hd, const Mesh& mesh, HdSolver& s) {
   }
   LinkBoundaryFacesHD(hd.boundary, s);
 
-  // Element -> (face, side) in the element's local face order.
-  s.element_face_start.assign(ne + 1);
-  s.element_face_start[1] = 1;
-  for (int e = 1; e <= ne; ++e) s.element_face_start[e + 1] = s.element_face_start[e] + ElementFaceCount(E, e);
-  const int nslots = std::max(0, s.element_face_start[ne + 1] - 1);
-  s.side_terms.assign(nslots);
+  // Face slots: plane j of element e for its local face j.
+  int planes = 0;
+  for (int e = 1; e <= ne; ++e) planes = std::max(planes, ElementFaceCount(E, e));
+  if (planes > 4) {
+    FatalError(SubstituteValue("SetupSolverHD: an element of the mesh has % faces; a 2D element has at most 4",
+                               planes));
+  }
+  s.face_planes = planes < 4 ? 3 : 4;
+  s.plane_stride = ne;
+  s.side_terms.assign(s.face_planes * ne);
   s.face_slot1.assign(nf, 0);
   s.face_slot2.assign(nf, 0);
   for (int e = 1; e <= ne; ++e) {
     for (int j = 1; j <= ElementFaceCount(E, e); ++j) {
       const int f = ElementFace(E, e, j);
-      (F.element1[f] == e ? s.face_slot1 : s.face_slot2)[f] = s.element_face_start[e] + j - 1;
+      (F.element1[f] == e ? s.face_slot1 : s.face_slot2)[f] = (j - 1) * ne + e;
     }
   }
 
@@ -758,117 +863,57 @@ void CalcDerivativesOnlySW2D(HdModule& hd, HdSolver& s, const Mesh& mesh, Array1
   const FaceLoopInput in = GatherInput(hd, s, mesh);
   const int ne =
       mesh.elements.nelements_int > 0 ? mesh.elements.nelements_int : mesh.elements.nelements;
-  const int* start = s.element_face_start.data();
   const HdSolver::SideTerms* terms = s.side_terms.data();
+  const int stride = s.plane_stride;
   const double* area = mesh.elements.area.data();
   const bool sums = dhdt != nullptr && dPdt != nullptr && dQdt != nullptr;
   if (sums) {
     for (Array1<double>* a : {dhdt, dPdt, dQdt}) a->assign(mesh.elements.nelements, 0.0);
   }
-  VHD_OMP_PARALLEL {
-    FaceTerms(hd, s, mesh, in);
-    if (sums) {
-      VHD_OMP_FOR
-      for (int e = 1; e <= ne; ++e) {
-        double sh, sP, sQ;
-        ElementSums(terms, start, e, sh, sP, sQ);
-        const double inv = 1.0 / area[e];
-        (*dhdt)[e] = sh * inv;
-        (*dPdt)[e] = sP * inv;
-        (*dQdt)[e] = sQ * inv;
-      }
+  VHD_OMP_PARALLEL { FaceTerms(hd, s, mesh, in); }
+  if (!sums) return;
+  ForFacePlanes(s, [&](auto planes) {
+    VHD_OMP_PARALLEL_FOR
+    for (int e = 1; e <= ne; ++e) {
+      double sh, sP, sQ;
+      ElementSums<planes>(terms, stride, e, sh, sP, sQ);
+      const double inv = 1.0 / area[e];
+      (*dhdt)[e] = sh * inv;
+      (*dPdt)[e] = sP * inv;
+      (*dQdt)[e] = sQ * inv;
     }
-  }
+  });
 }
 
 void CALCDERIVATIVESW2D(HdModule& hd, HdSolver& s, const Mesh& mesh, int stage, double dt,
                         bool last_stage) {
-  // Face terms, then the derivatives and the element update of the stage in
-  // one pass over the elements, all in one parallel region. The first stage
-  // takes the current state as the base of the step and, when more stages
-  // follow, keeps it in h_old, P_old, Q_old for them.
-  HdState& st = hd.state;
+  // Face terms (with the outflow limiter), then the derivatives and the
+  // element update of the stage in one pass over the elements. The first
+  // stage takes the current state as the base of the step and, when more
+  // stages follow, keeps it in h_old, P_old, Q_old for them.
   const FaceLoopInput in = GatherInput(hd, s, mesh);
   const int ne =
       mesh.elements.nelements_int > 0 ? mesh.elements.nelements_int : mesh.elements.nelements;
-  const int* start = s.element_face_start.data();
-  const HdSolver::SideTerms* terms = s.side_terms.data();
-  const double* area = mesh.elements.area.data();
   const bool first_stage = stage == 1;
-  const double h_min = hd.flood_dry.mass_depth;
-  const int damping = s.shallow_depth_option;
-  const bool iterate_drag = hd.solution.bed_resistance_discretization == 2;
-  constexpr double half_pi = 0.5 * std::numbers::pi;
   VHD_OMP_PARALLEL { FaceTerms(hd, s, mesh, in); }
   if (OutflowFactorsHD(hd, s, mesh, ne, first_stage, dt) > 0) LimitOutflowHD(hd, s, mesh, in);
-  VHD_OMP_PARALLEL {
-    VHD_OMP_FOR
-    for (int e = 1; e <= ne; ++e) {
-      double sh, sP, sQ;
-      ElementSums(terms, start, e, sh, sP, sQ);
-      const double inv = 1.0 / area[e];
-      const double dhdt = sh * inv, dPdt = sP * inv, dQdt = sQ * inv;
-      const double P = st.P[e], Q = st.Q[e];  // state of the stage
-      double hb, Pb, Qb;                      // base state of the step
-      if (first_stage) {
-        hb = st.h[e], Pb = P, Qb = Q;
-        if (!last_stage) {  // kept for the later stages
-          st.h_old[e] = hb;
-          st.P_old[e] = Pb;
-          st.Q_old[e] = Qb;
-        }
+  const bool iterate = hd.solution.bed_resistance_discretization == 2;
+  ForFacePlanes(s, [&](auto planes) {
+    auto update = [&](auto first, auto last) {
+      if (iterate) {
+        UpdateElementsHD<planes, first, last, true>(hd, s, mesh, ne, dt);
       } else {
-        hb = st.h_old[e];
-        Pb = st.P_old[e];
-        Qb = st.Q_old[e];
+        UpdateElementsHD<planes, first, last, false>(hd, s, mesh, ne, dt);
       }
-      double hn = hb + dt * (dhdt + s.src_h[e]);
-      double Pn, Qn;
-      if (st.wetdry[e] == kWet) {
-        double damp = 1.0;
-        if (damping == 1 && hn < 2.0 * h_min)
-          damp = hn > h_min ? std::sin((hn - h_min) * half_pi / h_min) : 0.0;
-        const double dts = dt * damp;
-        const double Ps = Pb + dts * (dPdt + s.src_P[e]);
-        const double Qs = Qb + dts * (dQdt + s.src_Q[e]);
-        const double cf = st.cf[e] + st.cf_surface[e];
-        Pn = Ps;
-        Qn = Qs;
-        if (cf > 0 && hn > h_min && hn > 0) {
-          // Semi-implicit drag r = cf |u| / h, with the velocity of the stage
-          // state over the new depth, then (on request) once more with the
-          // velocity of the result.
-          const double ih = 1.0 / hn;
-          double u = P * ih, v = Q * ih;
-          double damped = 1.0 / (1.0 + dts * cf * std::sqrt(u * u + v * v) * ih);
-          Pn = Ps * damped;
-          Qn = Qs * damped;
-          if (iterate_drag) {
-            u = Pn * ih, v = Qn * ih;
-            damped = 1.0 / (1.0 + dts * cf * std::sqrt(u * u + v * v) * ih);
-            Pn = Ps * damped;
-            Qn = Qs * damped;
-          }
-        }
-        if (damp == 0.0 && hb > 0) {
-          // Not accelerated below h_min: the element keeps the velocity of
-          // the base state and its momentum follows its depth (a momentum
-          // held while the water drains away would fling it out ever faster).
-          const double scale = std::max(0.0, hn) / hb;
-          Pn = Pb * scale;
-          Qn = Qb * scale;
-        }
-      } else {
-        Pn = Pb + dt * dPdt;
-        Qn = Qb + dt * dQdt;
-      }
-      if (!last_stage) hn = std::max(0.0, hn);
-      st.h[e] = hn;
-      st.eta[e] = hn - st.d[e];
-      st.P[e] = Pn;
-      st.Q[e] = Qn;
+    };
+    if (!first_stage) {
+      update(std::false_type{}, std::false_type{});
+    } else if (last_stage) {
+      update(std::true_type{}, std::true_type{});
+    } else {
+      update(std::true_type{}, std::false_type{});
     }
-  }
+  });
 }
 
 void CALCVELOCITYFILTER2D(HdModule& hd, HdSolver& s, const Mesh& mesh) {
