@@ -48,7 +48,7 @@ using detail::FlagView;
     }
     alpha = std::min(alpha, af);
   }
-  return alpha;
+  return alpha + 0.0;  // +0 for a factor of zero (a quotient dmin / d of it is -0)
 }
 
 // Raw arrays of n fields limited in one pass (outputs may be the inputs).
@@ -80,24 +80,30 @@ void BarthJespersenTableLanes(const LimiterGeometry2D& g, const int* flag, const
     // or an inactive one) reads the element itself, which leaves them as
     // they are. The index is chosen by arithmetic, not by a condition: a
     // load under a condition keeps the loop out of vector lanes.
-    bool active[kLimiterFaces2D];
-    double pmax = pe, pmin = pe, offset[kLimiterFaces2D];
+    // The factor needs only the largest rise and the deepest fall of the
+    // face values of the active faces: min over the faces of dmax / d (d >
+    // eps) is dmax / max d, as dmax >= 0 and a correctly rounded quotient is
+    // monotonic in d, and likewise dmin / min d for d < -eps; so two
+    // quotients per element instead of one per face.
+    double pmax = pe, pmin = pe, rise = 0.0, fall = 0.0;
     for (int j = 0; j < kLimiterFaces2D; ++j) {
       const int nb = neighbour[e][j];
-      active[j] = own & (nb != 0);
-      if constexpr (kFlags) active[j] = active[j] & (flag[nb] == 1);  // flag[0] is a spare slot
-      const double q = p[e + (nb - e) * static_cast<int>(active[j])];
+      bool active = own & (nb != 0);
+      if constexpr (kFlags) active = active & (flag[nb] == 1);  // flag[0] is a spare slot
+      const double q = p[e + (nb - e) * static_cast<int>(active)];
       pmax = std::max(pmax, q);
       pmin = std::min(pmin, q);
-      offset[j] = gx * offset_x[e][j] + gy * offset_y[e][j];
+      const double offset = gx * offset_x[e][j] + gy * offset_y[e][j];  // loaded for every face, as above
+      const double d = active ? offset : 0.0;
+      rise = std::max(rise, d);
+      fall = std::min(fall, d);
     }
     const double dmax = pmax - pe, dmin = pmin - pe;
-    double alpha = 1.0;
-    for (int j = 0; j < kLimiterFaces2D; ++j) {
-      const double d = offset[j];
-      const double af = d > eps ? std::min(1.0, dmax / d) : d < -eps ? std::min(1.0, dmin / d) : 1.0;
-      alpha = std::min(alpha, active[j] ? af : 1.0);
-    }
+    const double a_rise = rise > eps ? std::min(1.0, dmax / rise) : 1.0;
+    const double a_fall = fall < -eps ? std::min(1.0, dmin / fall) : 1.0;
+    // (+ 0.0: a factor of zero is +0 whichever bound gave it, so that the
+    // limited gradient does not depend on the order of the faces.)
+    const double alpha = std::min(a_rise, a_fall) + 0.0;
     gx_out[e] = alpha * gx;
     gy_out[e] = alpha * gy;
   }

@@ -70,6 +70,7 @@ void ReferenceBarthJespersen(const Mesh& m, const Array1<double>& phi, const Arr
       else if (d < -eps) af = std::min(1.0, (lo - phi[e]) / d);
       alpha = std::min(alpha, af);
     }
+    alpha += 0.0;  // a factor of zero is +0, whichever bound gave it
     gx[e] *= alpha;
     gy[e] *= alpha;
   }
