@@ -20,7 +20,10 @@ namespace {
 struct FaceLoopInput {
   const int* e1;
   const int* e2;
-  const double *ex, *ey, *nn, *len;  // unit normal, its length, face length
+  // Unit normal, its length and the face length per interior face, by the
+  // face's position in interior_faces; the mesh's face lengths.
+  const double *ex, *ey, *nn, *len;
+  const double* face_length;
   const double *eta, *d, *h, *P, *Q;
   const int* code;
   const double* k;
@@ -115,14 +118,14 @@ inline void WallTerms(const FaceLoopInput& in, int e, const SideValues& side, do
   my = -(pw * oy - Dy) + b * oy;
 }
 
-// Terms of a land boundary face f of wet element e (its element1): first
+// Terms of a land boundary face of wet element e (its element1): first
 // order at closed walls.
-void LandFaceTerms(const FaceLoopInput& in, HdSolver& s, int f, int e) {
+void LandFaceTerms(const FaceLoopInput& in, HdSolver& s, const BoundaryFaceRecord& rec) {
+  const int f = rec.face, e = rec.element;
   SideValues side{in.eta[e], in.P[e], in.Q[e], in.d[e], in.h[e]};
   if (in.fad != 0) FaceDepth(side, in.face_d[f]);
-  const double nn = in.nn[f];
   double mx, my;
-  WallTerms(in, e, side, in.ex[f], in.ey[f], nn, nn * in.len[f], mx, my);
+  WallTerms(in, e, side, rec.ex, rec.ey, rec.nn, rec.nn * in.face_length[f], mx, my);
   SetBoundaryFaceTerms(s, f, 0.0, mx, my);
 }
 
@@ -216,19 +219,20 @@ template <bool kSecond>
   return first;
 }
 
-// Terms of interior face f from the face values l, r of its sides: the flux
+// Terms of interior face f (position i in interior_faces) from the face
+// values l, r of its sides: the flux
 // of the Riemann solver, or the land treatment of the wet side against a dry
 // one, and the signed contributions of each side (scaled by theta, the
 // outflow factor of the upwind element).
 template <bool kSecond>
 void InteriorFaceTerms(const FaceLoopInput& in, HdSolver& s, double* face_flux, double* face_flux_len, int f,
-                       const SideValues& l, const SideValues& r, bool first, double theta) {
+                       int i, const SideValues& l, const SideValues& r, bool first, double theta) {
   const int L = in.e1[f], R = in.e2[f];
   const int cL = in.code[L], cR = in.code[R];
   const double etaL = in.eta[L], etaR = in.eta[R];  // centre values
   const double hL = in.h[L], hR = in.h[R];
-  const double ex = in.ex[f], ey = in.ey[f], nn = in.nn[f];
-  const double nlen = nn * in.len[f];  // length of the normal times the face length
+  const double ex = in.ex[i], ey = in.ey[i], nn = in.nn[i];
+  const double nlen = nn * in.len[i];  // length of the normal times the face length
 
   const bool riemann = RiemannFaceCase(cL, cR, etaL, in.d[L], etaR, in.d[R], kSecond);
   const double kL = in.k[L], kR = in.k[R];
@@ -274,7 +278,7 @@ void InteriorFaceTerms(const FaceLoopInput& in, HdSolver& s, double* face_flux, 
       }
     }
     RiemannFlux F =
-        RiemannFaceFluxUnit(sl, sr, ex, ey, nn, in.h_min, in.solver, in.entropy_fix, in.len[f], g, in.sqrt_g);
+        RiemannFaceFluxUnit(sl, sr, ex, ey, nn, in.h_min, in.solver, in.entropy_fix, in.len[i], g, in.sqrt_g);
     if (theta < 1.0) ScaleFlux(F, theta);
     if (in.eddy) {
       EddyFlux(0.5 * (in.nu[L] + in.nu[R]), 0.5 * (hL + hR), 0.5 * (in.ux[L] + in.ux[R]),
@@ -345,15 +349,16 @@ template <bool kSecond>
   return true;
 }
 
-// One interior face, every case: classification, face values, flux and the
-// signed contributions of each side.
+// One interior face (position i in interior_faces), every case:
+// classification, face values, flux and the signed contributions of each side.
 template <bool kSecond>
-inline void InteriorFace(const FaceLoopInput& in, HdSolver& s, double* face_flux, double* face_flux_len, int f,
+inline void InteriorFace(const FaceLoopInput& in, HdSolver& s, double* face_flux, double* face_flux_len, int i,
                          double theta = 1.0) {
+  const int f = s.interior_faces[i];
   SideValues l, r;
   bool first;
   if (!WetFaceValues<kSecond>(in, s, face_flux, face_flux_len, f, l, r, first)) return;
-  InteriorFaceTerms<kSecond>(in, s, face_flux, face_flux_len, f, l, r, first, theta);
+  InteriorFaceTerms<kSecond>(in, s, face_flux, face_flux_len, f, i, l, r, first, theta);
 }
 
 // Interior faces whose two sides are wet and at least h_move deep at the face
@@ -365,14 +370,18 @@ constexpr int kFaceBatch = 64;
 
 struct WetFaceBatch {
   int n = 0;
-  int face[kFaceBatch];
+  int face[kFaceBatch];      // mesh face
+  int position[kFaceBatch];  // position in interior_faces
   // Face values per side (l, r): depth, face d, P, Q, depth correction and
-  // the centre eta of the bed-slope term; the face geometry; the eddy flux.
+  // the centre eta of the bed-slope term; the eddy flux (zero without eddy
+  // viscosity).
   double hl[kFaceBatch], hr[kFaceBatch], dl[kFaceBatch], dr[kFaceBatch];
   double Pl[kFaceBatch], Pr[kFaceBatch], Ql[kFaceBatch], Qr[kFaceBatch];
   double kl[kFaceBatch], kr[kFaceBatch], etal[kFaceBatch], etar[kFaceBatch];
+  double Dx[kFaceBatch] = {}, Dy[kFaceBatch] = {};
+  // The face geometry, gathered only when the batch holds part of its chunk
+  // (a batch of the whole chunk reads the solver's arrays in place).
   double ex[kFaceBatch], ey[kFaceBatch], nn[kFaceBatch], len[kFaceBatch];
-  double Dx[kFaceBatch], Dy[kFaceBatch];
   // Second order: the velocity bound of the face (infinite where the face fell
   // back to first order) from the centre velocities of its sides.
   double umax[kFaceBatch], vmax[kFaceBatch];
@@ -383,22 +392,20 @@ struct WetFaceBatch {
 
 // Adds a plain wet face to the batch.
 template <bool kSecond>
-inline void AddWetFace(const FaceLoopInput& in, WetFaceBatch& b, int f, int L, int R, const SideValues& l,
-                       const SideValues& r, bool first) {
+inline void AddWetFace(const FaceLoopInput& in, WetFaceBatch& b, int f, int position, int L, int R,
+                       const SideValues& l, const SideValues& r, bool first) {
   const int i = b.n++;
   b.face[i] = f;
+  b.position[i] = position;
   b.hl[i] = l.h, b.hr[i] = r.h, b.dl[i] = l.d, b.dr[i] = r.d;
   b.Pl[i] = l.P, b.Pr[i] = r.P, b.Ql[i] = l.Q, b.Qr[i] = r.Q;
   b.kl[i] = in.k[L], b.kr[i] = in.k[R], b.etal[i] = in.eta[L], b.etar[i] = in.eta[R];
-  const double ex = in.ex[f], ey = in.ey[f], nn = in.nn[f], len = in.len[f];
-  b.ex[i] = ex, b.ey[i] = ey, b.nn[i] = nn, b.len[i] = len;
-  double Dx = 0.0, Dy = 0.0;
   if (in.eddy) {
+    const int p = position;
     EddyFlux(0.5 * (in.nu[L] + in.nu[R]), 0.5 * (in.h[L] + in.h[R]), 0.5 * (in.ux[L] + in.ux[R]),
-             0.5 * (in.uy[L] + in.uy[R]), 0.5 * (in.vx[L] + in.vx[R]), 0.5 * (in.vy[L] + in.vy[R]), ex, ey,
-             nn * len, Dx, Dy);
+             0.5 * (in.uy[L] + in.uy[R]), 0.5 * (in.vx[L] + in.vx[R]), 0.5 * (in.vy[L] + in.vy[R]), in.ex[p],
+             in.ey[p], in.nn[p] * in.len[p], b.Dx[i], b.Dy[i]);
   }
-  b.Dx[i] = Dx, b.Dy[i] = Dy;
   if constexpr (kSecond) {
     double uL, vL, uR, vR;
     if (first) {
@@ -416,7 +423,9 @@ inline void AddWetFace(const FaceLoopInput& in, WetFaceBatch& b, int f, int L, i
 // solver type fixed at compile time. (A function of its own: inlined into the
 // chunk loop, the compiler no longer turns this loop into vector code.)
 template <int kSolver, bool kSecond>
-[[gnu::noinline]] void WetFaceKernel(const FaceLoopInput& in, WetFaceBatch& b) {
+[[gnu::noinline]] void WetFaceKernel(const FaceLoopInput& in, WetFaceBatch& b, const double* __restrict gex,
+                                     const double* __restrict gey, const double* __restrict gnn,
+                                     const double* __restrict glen) {
   const int n = b.n;
   const double h_min = in.h_min, g = in.g, sqrt_g = in.sqrt_g;
   const int entropy_fix = in.entropy_fix;
@@ -435,10 +444,10 @@ template <int kSolver, bool kSecond>
       BoundVelocity(sl, b.umax[i], b.vmax[i]);
       BoundVelocity(sr, b.umax[i], b.vmax[i]);
     }
-    const double ex = b.ex[i], ey = b.ey[i], nn = b.nn[i];
-    const RiemannFlux F = RiemannFaceFluxUnit(sl, sr, ex, ey, nn, h_min, kSolver, entropy_fix, b.len[i], g, sqrt_g);
+    const double ex = gex[i], ey = gey[i], nn = gnn[i];
+    const RiemannFlux F = RiemannFaceFluxUnit(sl, sr, ex, ey, nn, h_min, kSolver, entropy_fix, glen[i], g, sqrt_g);
     const double fx = F.momx - b.Dx[i], fy = F.momy - b.Dy[i];
-    const double bd = g * F.d * (nn * b.len[i]);
+    const double bd = g * F.d * (nn * glen[i]);
     const double bL = (b.etal[i] + b.kl[i]) * bd, bR = (b.etar[i] + b.kr[i]) * bd;
     b.Fh[i] = F.Fh;
     b.mass[i] = F.mass;
@@ -449,14 +458,23 @@ template <int kSolver, bool kSecond>
   }
 }
 
+// The batch of the chunk of interior faces first .. last.
 template <bool kSecond>
-void WetFaceFluxes(const FaceLoopInput& in, WetFaceBatch& b) {
+void WetFaceFluxes(const FaceLoopInput& in, WetFaceBatch& b, int first, int last) {
+  const double *ex = in.ex + first, *ey = in.ey + first, *nn = in.nn + first, *len = in.len + first;
+  if (b.n < last - first + 1) {  // part of the chunk: its geometry side by side
+    for (int i = 0; i < b.n; ++i) {
+      const int p = b.position[i];
+      b.ex[i] = in.ex[p], b.ey[i] = in.ey[p], b.nn[i] = in.nn[p], b.len[i] = in.len[p];
+    }
+    ex = b.ex, ey = b.ey, nn = b.nn, len = b.len;
+  }
   switch (in.solver) {
-    case 1: WetFaceKernel<1, kSecond>(in, b); break;
-    case 2: WetFaceKernel<2, kSecond>(in, b); break;
-    case 3: WetFaceKernel<3, kSecond>(in, b); break;
-    case 4: WetFaceKernel<4, kSecond>(in, b); break;
-    default: WetFaceKernel<0, kSecond>(in, b); break;
+    case 1: WetFaceKernel<1, kSecond>(in, b, ex, ey, nn, len); break;
+    case 2: WetFaceKernel<2, kSecond>(in, b, ex, ey, nn, len); break;
+    case 3: WetFaceKernel<3, kSecond>(in, b, ex, ey, nn, len); break;
+    case 4: WetFaceKernel<4, kSecond>(in, b, ex, ey, nn, len); break;
+    default: WetFaceKernel<0, kSecond>(in, b, ex, ey, nn, len); break;
   }
 }
 
@@ -474,12 +492,12 @@ void InteriorFaceChunk(const FaceLoopInput& in, HdSolver& s, double* face_flux, 
     const bool plain = in.code[L] == kWet && in.code[R] == kWet && l.h >= in.h_move && r.h >= in.h_move &&
                        l.h > riemann_detail::kDryDepth && r.h > riemann_detail::kDryDepth;
     if (plain && s.vector_faces) {
-      AddWetFace<kSecond>(in, b, f, L, R, l, r, first);
+      AddWetFace<kSecond>(in, b, f, i, L, R, l, r, first);
     } else {
-      InteriorFaceTerms<kSecond>(in, s, face_flux, face_flux_len, f, l, r, first, 1.0);
+      InteriorFaceTerms<kSecond>(in, s, face_flux, face_flux_len, f, i, l, r, first, 1.0);
     }
   }
-  WetFaceFluxes<kSecond>(in, b);
+  WetFaceFluxes<kSecond>(in, b, first_index, last_index);
   for (int i = 0; i < b.n; ++i) {
     const int f = b.face[i];
     SetFaceTerms(s, f, b.mass[i], b.mx1[i], b.my1[i], b.mx2[i], b.my2[i]);
@@ -494,10 +512,11 @@ FaceLoopInput GatherInput(const HdModule& hd, const HdSolver& s, const Mesh& mes
   FaceLoopInput in;
   in.e1 = mesh.faces.element1.data();
   in.e2 = mesh.faces.element2.data();
-  in.ex = s.face_ex.data();
-  in.ey = s.face_ey.data();
-  in.nn = s.face_nn.data();
-  in.len = mesh.faces.length.data();
+  in.ex = s.interior_ex.data();
+  in.ey = s.interior_ey.data();
+  in.nn = s.interior_nn.data();
+  in.len = s.interior_len.data();
+  in.face_length = mesh.faces.length.data();
   in.eta = st.eta.data();
   in.d = st.d.data();
   in.h = st.h.data();
@@ -570,7 +589,7 @@ void FaceTerms(HdModule& hd, HdSolver& s, const Mesh& mesh, const FaceLoopInput&
     }
     st.face_flux[rec.face] = st.face_flux_len[rec.face] = 0.0;
     if (st.wetdry[rec.element] == kWet) {
-      LandFaceTerms(in, s, rec.face, rec.element);
+      LandFaceTerms(in, s, rec);
     } else {
       SetBoundaryFaceTerms(s, rec.face, 0.0, 0.0, 0.0);
     }
@@ -654,9 +673,9 @@ void LimitOutflowHD(HdModule& hd, HdSolver& s, const Mesh& mesh, const FaceLoopI
       const double theta = factor[m > 0 ? in.e1[f] : in.e2[f]];
       if (theta >= 1.0) continue;
       if (in.second) {
-        InteriorFace<true>(in, s, face_flux, face_flux_len, f, theta);
+        InteriorFace<true>(in, s, face_flux, face_flux_len, i, theta);
       } else {
-        InteriorFace<false>(in, s, face_flux, face_flux_len, f, theta);
+        InteriorFace<false>(in, s, face_flux, face_flux_len, i, theta);
       }
     }
     VHD_OMP_FOR_NOWAIT
@@ -820,9 +839,6 @@ void SetupSolverHD(HdModule& hd, const Mesh& mesh, HdSolver& s) {
   const int fad = hd.solution.face_average_d;
   HdState& st = hd.state;
   st.face_d.assign(nf);
-  s.face_ex.assign(nf);
-  s.face_ey.assign(nf);
-  s.face_nn.assign(nf);
   for (int f = 1; f <= nf; ++f) {
     const int a = F.element1[f], b = F.element2[f];
     if (fad == 2) {
@@ -833,11 +849,19 @@ void SetupSolverHD(HdModule& hd, const Mesh& mesh, HdSolver& s) {
     } else {
       st.face_d[f] = b > 0 ? 0.5 * (st.d[a] + st.d[b]) : st.d[a];
     }
-    const double nn = std::sqrt(F.nx[f] * F.nx[f] + F.ny[f] * F.ny[f]);
-    s.face_nn[f] = nn;
-    s.face_ex[f] = nn > 0 ? F.nx[f] / nn : 0.0;
-    s.face_ey[f] = nn > 0 ? F.ny[f] / nn : 0.0;
   }
+  auto unit_normal = [&](int f, double& ex, double& ey, double& nn) {
+    nn = std::sqrt(F.nx[f] * F.nx[f] + F.ny[f] * F.ny[f]);
+    ex = nn > 0 ? F.nx[f] / nn : 0.0;
+    ey = nn > 0 ? F.ny[f] / nn : 0.0;
+  };
+  for (Array1<double>* a : {&s.interior_ex, &s.interior_ey, &s.interior_nn, &s.interior_len}) a->assign(n_interior);
+  for (int i = 1; i <= n_interior; ++i) {
+    const int f = s.interior_faces[i];
+    unit_normal(f, s.interior_ex[i], s.interior_ey[i], s.interior_nn[i]);
+    s.interior_len[i] = F.length[f];
+  }
+  for (BoundaryFaceRecord& rec : s.boundary_faces) unit_normal(rec.face, rec.ex, rec.ey, rec.nn);
 
   for (Array1<double>* a : {&s.src_h, &s.src_P, &s.src_Q, &s.depth_correction}) a->assign(ne, 0.0);
   s.outflow_factor.assign(ne, 1.0);
@@ -854,7 +878,7 @@ void SetupSolverHD(HdModule& hd, const Mesh& mesh, HdSolver& s) {
 }
 
 void BoundaryFaceTerms(const HdModule& hd, HdSolver& s, const Mesh& mesh, const BoundaryFaceRecord& rec) {
-  LandFaceTerms(GatherInput(hd, s, mesh), s, rec.face, rec.element);
+  LandFaceTerms(GatherInput(hd, s, mesh), s, rec);
 }
 
 void CalcDerivativesOnlySW2D(HdModule& hd, HdSolver& s, const Mesh& mesh, Array1<double>* dhdt,

@@ -83,6 +83,7 @@ struct BoundaryFaceRecord {
   int element = 0;  // inner element (element1 of the face)
   int kind = kBoundaryLand;
   double values[8] = {0, 0, 0, 0, 0, 0, 0, 0};  // prepared outer values of the kind
+  double ex = 0, ey = 0, nn = 0;  // unit outward normal and the length of the mesh normal
 };
 
 // The solver's own setup-time tables and work arrays (allocated once).
@@ -100,10 +101,12 @@ struct HdSolver {
   int face_planes = 0;
   int plane_stride = 0;
 
-  // Per face: the unit normal (ex, ey) and the length nn of the mesh normal
-  // (nx = nn ex; nn is 1 on Cartesian meshes). (The face still water depth
-  // d_f of the bed-slope term is HdState::face_d, set here at setup.)
-  Array1<double> face_ex, face_ey, face_nn;
+  // Per interior face, in the order of interior_faces (so that the faces of
+  // a chunk of the face loop lie side by side): the unit normal (ex, ey), the
+  // length nn of the mesh normal (nx = nn ex; nn is 1 on Cartesian meshes)
+  // and the face length. (The face still water depth d_f of the bed-slope
+  // term is HdState::face_d, set here at setup.)
+  Array1<double> interior_ex, interior_ey, interior_nn, interior_len;
 
   // Face terms of the current stage, one slot per element and local face
   // (planes above): the water leaving the element through the face (m3/s,
