@@ -5,6 +5,7 @@
 #include <algorithm>
 #include <array>
 #include <string>
+#include <utility>
 
 #include "core/omp.hpp"
 #include "log/log.hpp"
@@ -58,67 +59,77 @@ struct BarthJespersenFields {
   std::array<double*, n> gx_out, gy_out;
 };
 
-// Barth-Jespersen through the precomputed table, one field after the other.
-// The factor is the one of BarthJespersenAlpha to the bit, written as
-// selects (every face evaluated; an inactive face neither widens the bounds
-// nor limits, and min(1, q) of a quotient q >= 1 is 1 as there) so that the
-// element loop runs in vector lanes. kFlags: element flags given (else every
-// element is active).
-template <bool kFlags>
-void BarthJespersenTableLanes(const LimiterGeometry2D& g, const int* flag, const double* p, const double* gx_in,
-                              const double* gy_in, double* gx_out, double* gy_out, double eps) {
+// Barth-Jespersen through the precomputed table, the n fields of a group in
+// one pass (the neighbours, their activity and the face offsets are read
+// once for all of them). The factor is the one of BarthJespersenAlpha to the
+// bit, written as selects (every face evaluated; an inactive face neither
+// widens the bounds nor limits) so that the element loop runs in vector
+// lanes. kFlags: element flags given (else every element is active).
+template <bool kFlags, int n>
+void BarthJespersenTableLanes(const LimiterGeometry2D& g, const int* flag, const BarthJespersenFields<n>& f,
+                              double eps) {
   const auto* neighbour = g.neighbour.data();
   const auto* offset_x = g.dx.data();
   const auto* offset_y = g.dy.data();
   const int nelements = g.nelements;
+  // Local copies of the field pointers: the loop stores through doubles
+  // cannot change them, so the fields unrolled below stay in vector lanes.
+  const std::array<const double*, n> phi = f.phi, gx_in = f.gx_in, gy_in = f.gy_in;
+  const std::array<double*, n> gx_out = f.gx_out, gy_out = f.gy_out;
   VHD_OMP_PARALLEL_FOR_SIMD
   for (int e = 1; e <= nelements; ++e) {
     const bool own = !kFlags || flag[e] == 1;
-    const double pe = p[e];
-    const double gx = gx_in[e], gy = gy_in[e];
-    // Bounds over the active neighbours: an inactive face (no neighbour, 0,
-    // or an inactive one) reads the element itself, which leaves them as
-    // they are. The index is chosen by arithmetic, not by a condition: a
-    // load under a condition keeps the loop out of vector lanes.
-    // The factor needs only the largest rise and the deepest fall of the
-    // face values of the active faces: min over the faces of dmax / d (d >
-    // eps) is dmax / max d, as dmax >= 0 and a correctly rounded quotient is
-    // monotonic in d, and likewise dmin / min d for d < -eps; so two
-    // quotients per element instead of one per face.
-    double pmax = pe, pmin = pe, rise = 0.0, fall = 0.0;
+    // An inactive face (no neighbour, 0, or an inactive one) reads the
+    // element itself, which leaves the bounds as they are. The index is
+    // chosen by arithmetic, not by a condition: a load under a condition
+    // keeps the loop out of vector lanes.
+    int source[kLimiterFaces2D];
+    bool active[kLimiterFaces2D];
     for (int j = 0; j < kLimiterFaces2D; ++j) {
       const int nb = neighbour[e][j];
-      bool active = own & (nb != 0);
-      if constexpr (kFlags) active = active & (flag[nb] == 1);  // flag[0] is a spare slot
-      const double q = p[e + (nb - e) * static_cast<int>(active)];
-      pmax = std::max(pmax, q);
-      pmin = std::min(pmin, q);
-      const double offset = gx * offset_x[e][j] + gy * offset_y[e][j];  // loaded for every face, as above
-      const double d = active ? offset : 0.0;
-      rise = std::max(rise, d);
-      fall = std::min(fall, d);
+      active[j] = own & (nb != 0);
+      if constexpr (kFlags) active[j] = active[j] & (flag[nb] == 1);  // flag[0] is a spare slot
+      source[j] = e + (nb - e) * static_cast<int>(active[j]);
     }
-    const double dmax = pmax - pe, dmin = pmin - pe;
-    const double a_rise = rise > eps ? std::min(1.0, dmax / rise) : 1.0;
-    const double a_fall = fall < -eps ? std::min(1.0, dmin / fall) : 1.0;
-    // (+ 0.0: a factor of zero is +0 whichever bound gave it, so that the
-    // limited gradient does not depend on the order of the faces.)
-    const double alpha = std::min(a_rise, a_fall) + 0.0;
-    gx_out[e] = alpha * gx;
-    gy_out[e] = alpha * gy;
+    // The factor needs only the largest rise and the deepest fall of the face
+    // values of the active faces: min over the faces of dmax / d (d > eps) is
+    // dmax / max d, as dmax >= 0 and a correctly rounded quotient is
+    // monotonic in d, and likewise dmin / min d for d < -eps; so two
+    // quotients per element instead of one per face.
+#pragma GCC unroll 4
+    for (int k = 0; k < n; ++k) {
+      const double* p = phi[k];
+      const double pe = p[e];
+      const double gx = gx_in[k][e], gy = gy_in[k][e];
+      double pmax = pe, pmin = pe, rise = 0.0, fall = 0.0;
+      for (int j = 0; j < kLimiterFaces2D; ++j) {
+        const double q = p[source[j]];
+        pmax = std::max(pmax, q);
+        pmin = std::min(pmin, q);
+        const double offset = gx * offset_x[e][j] + gy * offset_y[e][j];  // formed for every face: a select, not a load
+        const double d = active[j] ? offset : 0.0;
+        rise = std::max(rise, d);
+        fall = std::min(fall, d);
+      }
+      const double dmax = pmax - pe, dmin = pmin - pe;
+      const double a_rise = rise > eps ? std::min(1.0, dmax / rise) : 1.0;
+      const double a_fall = fall < -eps ? std::min(1.0, dmin / fall) : 1.0;
+      // (+ 0.0: a factor of zero is +0 whichever bound gave it, so that the
+      // limited gradient does not depend on the order of the faces.)
+      const double alpha = std::min(a_rise, a_fall) + 0.0;
+      gx_out[k][e] = alpha * gx;
+      gy_out[k][e] = alpha * gy;
+    }
   }
 }
 
 template <int n>
 void BarthJespersenTable(const LimiterGeometry2D& g, const Array1<int>& element_flags,
                          const BarthJespersenFields<n>& f, double eps) {
-  const int* flag = element_flags.empty() ? nullptr : element_flags.data();
-  for (int i = 0; i < n; ++i) {
-    if (flag == nullptr) {
-      BarthJespersenTableLanes<false>(g, flag, f.phi[i], f.gx_in[i], f.gy_in[i], f.gx_out[i], f.gy_out[i], eps);
-    } else {
-      BarthJespersenTableLanes<true>(g, flag, f.phi[i], f.gx_in[i], f.gy_in[i], f.gx_out[i], f.gy_out[i], eps);
-    }
+  if (element_flags.empty()) {
+    BarthJespersenTableLanes<false, n>(g, nullptr, f, eps);
+  } else {
+    BarthJespersenTableLanes<true, n>(g, element_flags.data(), f, eps);
   }
 }
 
