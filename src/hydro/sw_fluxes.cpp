@@ -30,6 +30,7 @@ struct FaceLoopInput {
   const double* face_d;
   bool second;
   const double *xf, *yf, *xc, *yc;  // face centres and centroids
+  const int *face_start, *face_list;  // faces of each element
   const double *eta_x, *eta_y, *P_x, *P_y, *Q_x, *Q_y;
   bool eddy;
   const double *nu, *ux, *uy, *vx, *vy;
@@ -123,7 +124,33 @@ inline void WallTerms(const FaceLoopInput& in, int e, const SideValues& side, do
 void LandFaceTerms(const FaceLoopInput& in, HdSolver& s, const BoundaryFaceRecord& rec) {
   const int f = rec.face, e = rec.element;
   SideValues side{in.eta[e], in.P[e], in.Q[e], in.d[e], in.h[e]};
-  if (in.fad != 0) FaceDepth(side, in.face_d[f]);
+  if (in.second && !(in.face_limit_dry && 0.05 * (in.h_min + 2.0 * side.h) > side.h)) {
+    // The wall sees the surface at the face, as the interior faces of the
+    // element do: with the centre surface, a surface sloping along the wall
+    // would press on the wall with the depth of the centre, and flow along a
+    // wall would be pushed across. The gradient limiter does not look at
+    // boundary faces, so the face surface is clipped to the range of the
+    // element and its wet neighbours. The water at the wall moves with the
+    // element's velocity (P and eta reconstructed apart could give a thin
+    // face any speed).
+    double lo = side.eta, hi = side.eta;
+    for (int k = in.face_start[e]; k < in.face_start[e + 1]; ++k) {
+      const int g = in.face_list[k];
+      const int nb = g == 0 ? 0 : (in.e1[g] == e ? in.e2[g] : in.e1[g]);
+      if (nb <= 0 || in.code[nb] != kWet) continue;
+      lo = std::min(lo, in.eta[nb]);
+      hi = std::max(hi, in.eta[nb]);
+    }
+    const double ax = in.xf[f] - in.xc[e], ay = in.yf[f] - in.yc[e];
+    side.eta = std::clamp(side.eta + in.eta_x[e] * ax + in.eta_y[e] * ay, lo, hi);
+    const double hc = side.h;
+    FaceDepth(side, in.fad != 0 ? in.face_d[f] : in.d[e]);
+    const double ratio = hc > 0 ? side.h / hc : 0.0;
+    side.P *= ratio;
+    side.Q *= ratio;
+  } else if (in.fad != 0) {
+    FaceDepth(side, in.face_d[f]);
+  }
   double mx, my;
   WallTerms(in, e, side, rec.ex, rec.ey, rec.nn, rec.nn * in.face_length[f], mx, my);
   SetBoundaryFaceTerms(s, f, 0.0, mx, my);
@@ -530,6 +557,8 @@ FaceLoopInput GatherInput(const HdModule& hd, const HdSolver& s, const Mesh& mes
   in.yf = mesh.faces.yf.data();
   in.xc = mesh.elements.xc.data();
   in.yc = mesh.elements.yc.data();
+  in.face_start = mesh.elements.face_start.data();
+  in.face_list = mesh.elements.face_list.data();
   in.eta_x = s.eta_x.data();
   in.eta_y = s.eta_y.data();
   in.P_x = s.P_x.data();

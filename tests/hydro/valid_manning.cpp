@@ -106,10 +106,11 @@ TEST(ValidManning, UniformFlowTendsToTheNormalDepth) {
                 "%.1e u_n, |h - h_n(q)| %.1e h; elements |u - u_exact| %.1e u_n, |h - h0| %.1e h0, |v| %.1e u_n\n",
                 k.u0, un, k.solver, k.order, k.drag, r.u_mean_error, r.hn_mean_error, r.u_error, r.h_error, r.v_max);
     // The reach as a whole is at the normal flow; single elements of the
-    // jittered mesh scatter about it by a few per cent.
+    // jittered mesh scatter about it by 1.5 per cent at either order (5 per
+    // cent at second order when the walls saw the centre surface).
     EXPECT_LT(r.u_mean_error, 1e-3);
     EXPECT_LT(r.hn_mean_error, 2e-3);
-    EXPECT_LT(r.u_error, 0.06);
+    EXPECT_LT(r.u_error, 0.025);
     EXPECT_LT(r.h_error, 0.01);
     EXPECT_LT(r.v_max, 0.03);
   }
