@@ -628,14 +628,14 @@ void FaceTerms(HdModule& hd, HdSolver& s, const Mesh& mesh, const FaceLoopInput&
 // Sums of the face terms of element e in its local face order (slots of the
 // planes, kPlanes of them; a slot beyond the element's faces adds zero).
 template <int kPlanes>
-[[gnu::always_inline]] inline void ElementSums(const HdSolver::SideTerms* terms, int stride, int e, double& sh,
-                                               double& sP, double& sQ) {
+[[gnu::always_inline]] inline void ElementSums(const HdSolver& s, int e, double& sh, double& sP, double& sQ) {
+  const double *out = s.side_out.data(), *mx = s.side_mx.data(), *my = s.side_my.data();
   sh = sP = sQ = 0.0;
   for (int j = 0; j < kPlanes; ++j) {
-    const HdSolver::SideTerms& t = terms[j * stride + e];
-    sh -= t.out;
-    sP += t.mx;
-    sQ += t.my;
+    const int k = j * s.plane_stride + e;
+    sh -= out[k];
+    sP += mx[k];
+    sQ += my[k];
   }
 }
 
@@ -664,7 +664,7 @@ void ForFacePlanes(const HdSolver& s, Fn&& fn) {
 // Returns the number of limited elements.
 int OutflowFactorsHD(HdModule& hd, HdSolver& s, const Mesh& mesh, int ne, bool first_stage, double dt) {
   const HdState& st = hd.state;
-  const HdSolver::SideTerms* terms = s.side_terms.data();
+  const double* out_terms = s.side_out.data();
   const int stride = s.plane_stride;
   const double* area = mesh.elements.area.data();
   const double* hbase = first_stage ? st.h.data() : st.h_old.data();
@@ -675,7 +675,7 @@ int OutflowFactorsHD(HdModule& hd, HdSolver& s, const Mesh& mesh, int ne, bool f
     VHD_OMP_PARALLEL_FOR_SIMD_REDUCTION(+, nlimited)
     for (int e = 1; e <= ne; ++e) {
       double out = 0.0;
-      for (int j = 0; j < planes; ++j) out += std::max(0.0, terms[j * stride + e].out);
+      for (int j = 0; j < planes; ++j) out += std::max(0.0, out_terms[j * stride + e]);
       const double held = std::max(0.0, hbase[e] + dt * src_h[e]) * area[e];
       const bool limited = dt * out > held;
       factor[e] = limited ? held / (dt * out) : 1.0;
@@ -729,8 +729,6 @@ void LimitOutflowHD(HdModule& hd, HdSolver& s, const Mesh& mesh, const FaceLoopI
 template <int kPlanes, bool kFirst, bool kLast, bool kIterate>
 void UpdateElementsHD(HdModule& hd, const HdSolver& s, const Mesh& mesh, int ne, double dt) {
   HdState& st = hd.state;
-  const HdSolver::SideTerms* terms = s.side_terms.data();
-  const int stride = s.plane_stride;
   const double* area = mesh.elements.area.data();
   const int* code = st.wetdry.data();
   const double* d = st.d.data();
@@ -747,7 +745,7 @@ void UpdateElementsHD(HdModule& hd, const HdSolver& s, const Mesh& mesh, int ne,
   VHD_OMP_PARALLEL_FOR_SIMD
   for (int e = 1; e <= ne; ++e) {
     double sh, sP, sQ;
-    ElementSums<kPlanes>(terms, stride, e, sh, sP, sQ);
+    ElementSums<kPlanes>(s, e, sh, sP, sQ);
     const double inv = 1.0 / area[e];
     const double dhdt = sh * inv, dPdt = sP * inv, dQdt = sQ * inv;
     const double Pe = P[e], Qe = Q[e];  // state of the stage
@@ -853,7 +851,7 @@ void SetupSolverHD(HdModule& hd, const Mesh& mesh, HdSolver& s) {
   }
   s.face_planes = planes < 4 ? 3 : 4;
   s.plane_stride = ne;
-  s.side_terms.assign(s.face_planes * ne);
+  for (Array1<double>* a : {&s.side_out, &s.side_mx, &s.side_my}) a->assign(s.face_planes * ne, 0.0);
   s.face_slot1.assign(nf, 0);
   s.face_slot2.assign(nf, 0);
   for (int e = 1; e <= ne; ++e) {
@@ -916,8 +914,6 @@ void CalcDerivativesOnlySW2D(HdModule& hd, HdSolver& s, const Mesh& mesh, Array1
   const FaceLoopInput in = GatherInput(hd, s, mesh);
   const int ne =
       mesh.elements.nelements_int > 0 ? mesh.elements.nelements_int : mesh.elements.nelements;
-  const HdSolver::SideTerms* terms = s.side_terms.data();
-  const int stride = s.plane_stride;
   const double* area = mesh.elements.area.data();
   const bool sums = dhdt != nullptr && dPdt != nullptr && dQdt != nullptr;
   if (sums) {
@@ -929,7 +925,7 @@ void CalcDerivativesOnlySW2D(HdModule& hd, HdSolver& s, const Mesh& mesh, Array1
     VHD_OMP_PARALLEL_FOR
     for (int e = 1; e <= ne; ++e) {
       double sh, sP, sQ;
-      ElementSums<planes>(terms, stride, e, sh, sP, sQ);
+      ElementSums<planes>(s, e, sh, sP, sQ);
       const double inv = 1.0 / area[e];
       (*dhdt)[e] = sh * inv;
       (*dPdt)[e] = sP * inv;

@@ -113,10 +113,7 @@ struct HdSolver {
   // negative when it enters) and the momentum terms of that side (m4/s2).
   // face_slot1/2 give the slots of the face's element1 and element2 sides (0
   // for a boundary face's outer side).
-  struct SideTerms {
-    double out = 0, mx = 0, my = 0;
-  };
-  Array1<SideTerms> side_terms;
+  Array1<double> side_out, side_mx, side_my;
   Array1<int> face_slot1, face_slot2;
 
   // Gradient stencil (second order or eddy viscosity), built once at setup,
@@ -212,13 +209,15 @@ inline bool RiemannFaceCase(int cL, int cR, double etaL, double dL, double etaR,
 // Terms of face f for both sides: mass flux (m3/s, positive from element1 to
 // element2) and the momentum terms of each side.
 inline void SetFaceTerms(HdSolver& s, int f, double mass, double mx1, double my1, double mx2, double my2) {
-  s.side_terms[s.face_slot1[f]] = {mass, mx1, my1};
-  s.side_terms[s.face_slot2[f]] = {-mass, mx2, my2};
+  const int a = s.face_slot1[f], b = s.face_slot2[f];
+  s.side_out[a] = mass, s.side_mx[a] = mx1, s.side_my[a] = my1;
+  s.side_out[b] = -mass, s.side_mx[b] = mx2, s.side_my[b] = my2;
 }
 
 // Terms of boundary face f for its inner side (element1).
 inline void SetBoundaryFaceTerms(HdSolver& s, int f, double mass, double mx, double my) {
-  s.side_terms[s.face_slot1[f]] = {mass, mx, my};
+  const int a = s.face_slot1[f];
+  s.side_out[a] = mass, s.side_mx[a] = mx, s.side_my[a] = my;
 }
 
 // Terms of a boundary face closed as land (the record's face and inner
