@@ -2,11 +2,11 @@
 
 #include <algorithm>
 #include <array>
-#include <type_traits>
 #include <cmath>
 #include <limits>
 #include <numbers>
 #include <string>
+#include <type_traits>
 
 #include "core/omp.hpp"
 #include "hydro/reconstruction.hpp"
@@ -119,8 +119,7 @@ inline void WallTerms(const FaceLoopInput& in, int e, const SideValues& side, do
   my = -(pw * oy - Dy) + b * oy;
 }
 
-// Terms of a land boundary face of wet element e (its element1): first
-// order at closed walls.
+// Terms of a land boundary face of wet element e (its element1).
 void LandFaceTerms(const FaceLoopInput& in, HdSolver& s, const BoundaryFaceRecord& rec) {
   const int f = rec.face, e = rec.element;
   SideValues side{in.eta[e], in.P[e], in.Q[e], in.d[e], in.h[e]};
@@ -247,10 +246,9 @@ template <bool kSecond>
 }
 
 // Terms of interior face f (position i in interior_faces) from the face
-// values l, r of its sides: the flux
-// of the Riemann solver, or the land treatment of the wet side against a dry
-// one, and the signed contributions of each side (scaled by theta, the
-// outflow factor of the upwind element).
+// values l, r of its sides: the flux of the Riemann solver, or the land
+// treatment of the wet side against a dry one, and the signed contributions
+// of each side (scaled by theta, the outflow factor of the upwind element).
 template <bool kSecond>
 void InteriorFaceTerms(const FaceLoopInput& in, HdSolver& s, double* face_flux, double* face_flux_len, int f,
                        int i, const SideValues& l, const SideValues& r, bool first, double theta) {

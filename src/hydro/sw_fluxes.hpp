@@ -18,8 +18,8 @@
 // (positive from element1 to element2) and the new h, eta, P, Q.
 //
 // Threads. The face loop writes each face's contributions into two slots,
-// one per side, held per element in the element's local face order; the
-// element loop then sums each element's slots in that order. No two threads
+// one per side, each element having one slot per local face; the element
+// loop then sums each element's slots in its local face order. No two threads
 // ever add to one element, and the order of additions is fixed, so results
 // are the same to the last bit for any thread count. The face loop takes the
 // faces in chunks: faces with two wet sides deep enough ("plain wet faces")
@@ -35,6 +35,10 @@
 //     every velocity around); a side that is not wet passes P = Q = 0 with
 //     its zero velocity, a wet side its velocity at any depth (with the
 //     type-4 solver only from h_min on);
+//   - with second order a land face sees the surface reconstructed to the
+//     face, clipped to the range of the element and its wet neighbours (the
+//     gradient limiter does not look at boundary faces), and the element's
+//     velocity at that depth;
 //   - a face that falls back to first order next to a nearly dry side keeps
 //     the centre values, d and h of that side only: the deeper side passes
 //     its centre eta and velocity with its depth at the face from d_f;
@@ -45,8 +49,8 @@
 //     g X^2/2 n_y len of the y form sums to zero over a closed element),
 //     with d the face d that the pressure of the face saw: the flux's own
 //     face d (RiemannFlux::d; d_f when both sides pass d_f) at Riemann
-//     faces, the side's face d at walls. With d_f at every face, as the
-//     product states it, pressure and bed slope cancel only for a surface at
+//     faces, the side's face d at walls. With d_f at every face for both
+//     terms, pressure and bed slope would cancel only for a surface at
 //     datum: where a side passes another d (its centre d with
 //     face_average_d 0, or d clipped to the surface where the surface lies
 //     below the face bed) a lake at rest at another level would start to
