@@ -60,7 +60,7 @@ bool VelocityStressAndBlowUpTest(HdModule& hd, const HdSolver& solver, double& r
     const double re = CflRate(code[e], eta[e], d[e], ue, ve, length[e], gravity);
     rate[e] = re;
     r = std::max(r, re);
-    const bool bad = !(eta[e] <= limit) | (depth_test & !(h[e] > 0.0));
+    const bool bad = (!(eta[e] <= limit)) | (depth_test & (!(h[e] > 0.0)));
     failed = std::max(failed, bad ? 1 : 0);
   }
   for (int e = nown + 1; e <= ne; ++e) {
