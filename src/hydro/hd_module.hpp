@@ -319,6 +319,11 @@ struct HdModule {
   // its end-of-step pass with state.cfl_rate; taken (once) by the next
   // CALCTIMESTEPHD instead of a pass of its own. Negative: not available.
   double cfl_rate_max_ready = -1.0;
+  // Largest CFL rate of state.cfl_rate as CALCTIMESTEPHD used it, for the
+  // next StepHD, which then scans the elements for violations only when this
+  // rate itself violates (every CFL number is at most its one). Negative:
+  // not available (StepHD scans).
+  double cfl_rate_max_of_step = -1.0;
 
   TimingSet timing;
   HdState state;

@@ -98,6 +98,7 @@ double CALCTIMESTEPHD(HdModule& hd, const HdSolver& solver, const Mesh& mesh, do
   // The rates of the state left by the last sub-step come with its end pass.
   const double rmax = hd.cfl_rate_max_ready >= 0 ? hd.cfl_rate_max_ready : CalcCflRatesHD(hd, solver, mesh);
   hd.cfl_rate_max_ready = -1.0;
+  hd.cfl_rate_max_of_step = rmax;
   double dt;
   if (c.CFL_critical_HD / c.dt_max_HD > rmax) {
     dt = c.dt_max_HD;
@@ -182,14 +183,20 @@ void StepHD(HdModule& hd, HdSolver& solver, const Mesh& mesh, double t, double d
   start(kHdTimerTotal);
 
   RecordTimeStepHD(hd, dt);
-  // CFL numbers; the report walks the elements again only when one of them
+  // CFL numbers: the elements are scanned only when the largest rate of the
+  // state violates the condition (no CFL number exceeds its one, rounding
+  // being monotonic), and the report walks them again only when one of them
   // is violated.
   const int ne = st.nelements_owned;
   int violated = 0;
-  VHD_OMP_PARALLEL_FOR_SIMD_REDUCTION(max, violated)
-  for (int e = 1; e <= ne; ++e) {
-    const bool over = (CflNumber(st.cfl_rate[e], dt) > 1.00001) & (st.wetdry[e] == kWet);
-    violated = std::max(violated, over ? 1 : 0);
+  const double rate_max = hd.cfl_rate_max_of_step;
+  hd.cfl_rate_max_of_step = -1.0;
+  if (!(rate_max >= 0 && CflNumber(rate_max, dt) <= 1.00001)) {
+    VHD_OMP_PARALLEL_FOR_SIMD_REDUCTION(max, violated)
+    for (int e = 1; e <= ne; ++e) {
+      const bool over = (CflNumber(st.cfl_rate[e], dt) > 1.00001) & (st.wetdry[e] == kWet);
+      violated = std::max(violated, over ? 1 : 0);
+    }
   }
   if (violated) {
     ReportCflViolations("CFL condition violated in HD calculation", mesh, st.cfl_rate, st.wetdry, &st.d, st.length,
