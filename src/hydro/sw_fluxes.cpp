@@ -61,16 +61,20 @@ inline void FaceDepth(SideValues& side, double df) {
   side.h = side.eta + side.d;
 }
 
-// The deeper side of a face that fell back to first order next to a nearly
-// dry side. The nearly dry side keeps its centre values, d and h; the deeper
-// side keeps its centre eta and velocity (its gradients are formed across the
-// shore, where the eta of dry elements is their bed) but takes its depth at
-// the face, max(0, eta + d_f), and carries its velocity with that depth.
-// With its centre depth at the face, the deeper side of a shore face on a
-// beach would see the water deeper than it is there, push it onto the beach
-// and damp a run-up and run-down. Pressure and bed slope use the d that each
-// side passes, so water at rest stays at rest.
-inline void DeepSideAtDryFace(SideValues& side, double df) {
+// A side that keeps its velocity but takes its depth at the face from d_f
+// (FaceDepth), its momentum following that depth. Used where the face values
+// are not all reconstructed:
+//  - the deeper side of a face that fell back to first order next to a
+//    nearly dry side (the nearly dry side keeps its centre values, d and h;
+//    the deeper side's gradients are formed across the shore, where the eta
+//    of dry elements is their bed, so it keeps its centre eta). With its
+//    centre depth, the deeper side of a shore face on a beach would see the
+//    water deeper than it is there, push it onto the beach and damp a run-up
+//    and run-down;
+//  - a wet side at a second-order land face, whose eta is reconstructed.
+// Pressure and bed slope use the d that each side passes, so water at rest
+// stays at rest.
+inline void VelocityAtFaceDepth(SideValues& side, double df) {
   const double hc = side.h;
   FaceDepth(side, df);
   const double ratio = hc > 0 ? side.h / hc : 0.0;
@@ -142,11 +146,7 @@ void LandFaceTerms(const FaceLoopInput& in, HdSolver& s, const BoundaryFaceRecor
     }
     const double ax = in.xf[f] - in.xc[e], ay = in.yf[f] - in.yc[e];
     side.eta = std::clamp(side.eta + in.eta_x[e] * ax + in.eta_y[e] * ay, lo, hi);
-    const double hc = side.h;
-    FaceDepth(side, in.fad != 0 ? in.face_d[f] : in.d[e]);
-    const double ratio = hc > 0 ? side.h / hc : 0.0;
-    side.P *= ratio;
-    side.Q *= ratio;
+    VelocityAtFaceDepth(side, in.fad != 0 ? in.face_d[f] : in.d[e]);
   } else if (in.fad != 0) {
     FaceDepth(side, in.face_d[f]);
   }
@@ -202,7 +202,7 @@ template <bool kSecond>
   if constexpr (kSecond) {
     const double limit = 0.05 * (in.h_min + hL + hR);
     first = in.face_limit_dry && (limit > hL || limit > hR);
-    if (first && in.fad != 0 && (limit > hL) != (limit > hR)) DeepSideAtDryFace(limit > hL ? r : l, in.face_d[f]);
+    if (first && in.fad != 0 && (limit > hL) != (limit > hR)) VelocityAtFaceDepth(limit > hL ? r : l, in.face_d[f]);
     if (!first) {
       const double xf = in.xf[f], yf = in.yf[f];
       const double ax = xf - in.xc[L], ay = yf - in.yc[L], bx = xf - in.xc[R], by = yf - in.yc[R];

@@ -17,39 +17,38 @@ namespace {
 
 using detail::FlagView;
 
+// Barth-Jespersen factor from the bounds dmax >= 0, dmin <= 0 of the
+// neighbour values about the element's own and the largest rise (>= 0) and
+// deepest fall (<= 0) of the extrapolated face increments of the limiting
+// faces. This is the minimum over those faces of min(1, dmax / d) (d > eps)
+// and min(1, dmin / d) (d < -eps) to the bit: dmax / d falls as d grows and
+// a correctly rounded quotient is monotonic, so the smallest quotient is the
+// one of the largest rise, and likewise for the falls. A factor of zero is
+// +0 whichever bound gave it, so that the limited gradient does not depend
+// on the order of the faces.
+inline double BarthJespersenFactor(double dmax, double dmin, double rise, double fall, double eps) {
+  const double a_rise = rise > eps ? std::min(1.0, dmax / rise) : 1.0;
+  const double a_fall = fall < -eps ? std::min(1.0, dmin / fall) : 1.0;
+  return std::min(a_rise, a_fall) + 0.0;
+}
+
 // Barth-Jespersen factor alpha of one field on element e with unlimited
 // gradient (gx, gy): slot j < count is a face towards an active neighbour
 // when active[j], with neighbour nb[j] and face-centre offset (dx[j], dy[j]).
-// Slots are visited in local face order. Inlined into the element loops, so
-// that the neighbour activity stays in registers across the fields.
 [[gnu::always_inline]] inline double BarthJespersenAlpha(const double* p, int e, double gx, double gy, int count,
                                                          const int* nb, const bool* active, const double* dx,
                                                          const double* dy, double eps) {
   const double pe = p[e];
-  double pmax = pe, pmin = pe;
+  double pmax = pe, pmin = pe, rise = 0.0, fall = 0.0;
   for (int j = 0; j < count; ++j) {
     if (!active[j]) continue;
     pmax = std::max(pmax, p[nb[j]]);
     pmin = std::min(pmin, p[nb[j]]);
-  }
-  const double dmax = pmax - pe, dmin = pmin - pe;
-  double alpha = 1.0;
-  for (int j = 0; j < count; ++j) {
-    if (!active[j]) continue;
     const double d = gx * dx[j] + gy * dy[j];
-    // af = min(1, dmax/d) for d > eps, min(1, dmin/d) for d < -eps, else 1;
-    // the quotient is formed only when it is below 1, which gives the same
-    // bits (a correctly rounded quotient of a ratio >= 1 is >= 1) and spares
-    // the division on the faces that do not limit.
-    double af = 1.0;
-    if (d > eps) {
-      if (dmax < d) af = dmax / d;
-    } else if (d < -eps) {
-      if (dmin > d) af = dmin / d;
-    }
-    alpha = std::min(alpha, af);
+    rise = std::max(rise, d);
+    fall = std::min(fall, d);
   }
-  return alpha + 0.0;  // +0 for a factor of zero (a quotient dmin / d of it is -0)
+  return BarthJespersenFactor(pmax - pe, pmin - pe, rise, fall, eps);
 }
 
 // Raw arrays of n fields limited in one pass (outputs may be the inputs).
@@ -91,11 +90,6 @@ void BarthJespersenTableLanes(const LimiterGeometry2D& g, const int* flag, const
       if constexpr (kFlags) active[j] = active[j] & (flag[nb] == 1);  // flag[0] is a spare slot
       source[j] = e + (nb - e) * static_cast<int>(active[j]);
     }
-    // The factor needs only the largest rise and the deepest fall of the face
-    // values of the active faces: min over the faces of dmax / d (d > eps) is
-    // dmax / max d, as dmax >= 0 and a correctly rounded quotient is
-    // monotonic in d, and likewise dmin / min d for d < -eps; so two
-    // quotients per element instead of one per face.
 #pragma GCC unroll 4
     for (int k = 0; k < n; ++k) {
       const double* p = phi[k];
@@ -111,12 +105,7 @@ void BarthJespersenTableLanes(const LimiterGeometry2D& g, const int* flag, const
         rise = std::max(rise, d);
         fall = std::min(fall, d);
       }
-      const double dmax = pmax - pe, dmin = pmin - pe;
-      const double a_rise = rise > eps ? std::min(1.0, dmax / rise) : 1.0;
-      const double a_fall = fall < -eps ? std::min(1.0, dmin / fall) : 1.0;
-      // (+ 0.0: a factor of zero is +0 whichever bound gave it, so that the
-      // limited gradient does not depend on the order of the faces.)
-      const double alpha = std::min(a_rise, a_fall) + 0.0;
+      const double alpha = BarthJespersenFactor(pmax - pe, pmin - pe, rise, fall, eps);
       gx_out[k][e] = alpha * gx;
       gy_out[k][e] = alpha * gy;
     }
@@ -179,29 +168,20 @@ void BarthJespersen3D(const Mesh& mesh, const Array1<double>& phi, const Array1<
     double alpha = 1.0;
     if (flags.Active(e)) {
       const double pe = p[e];
-      double pmax = pe, pmin = pe;
-      const int f0 = el.face_start[e], f1 = el.face_start[e + 1];
-      for (int q = f0; q < f1; ++q) {
+      double pmax = pe, pmin = pe, rise = 0.0, fall = 0.0;
+      for (int q = el.face_start[e]; q < el.face_start[e + 1]; ++q) {
         const int f = el.face_list[q];
         if (f == 0) continue;
         const int nb = fc.element1[f] == e ? fc.element2[f] : fc.element1[f];
         if (nb == 0 || !flags.Active(nb)) continue;
         pmax = std::max(pmax, p[nb]);
         pmin = std::min(pmin, p[nb]);
-      }
-      const double dmax = pmax - pe, dmin = pmin - pe;
-      for (int q = f0; q < f1; ++q) {
-        const int f = el.face_list[q];
-        if (f == 0) continue;
-        const int nb = fc.element1[f] == e ? fc.element2[f] : fc.element1[f];
-        if (nb == 0 || !flags.Active(nb)) continue;
         const double d = gx * detail::DeltaX(el.xc[e], fc.xf[f], geo) + gy * (fc.yf[f] - el.yc[e]) +
                          gz * (fc.zf[f] - el.zc[e]);
-        double af = 1.0;
-        if (d > eps) af = std::min(1.0, dmax / d);
-        else if (d < -eps) af = std::min(1.0, dmin / d);
-        alpha = std::min(alpha, af);
+        rise = std::max(rise, d);
+        fall = std::min(fall, d);
       }
+      alpha = BarthJespersenFactor(pmax - pe, pmin - pe, rise, fall, eps);
     }
     gx_out[e] = alpha * gx;
     gy_out[e] = alpha * gy;
