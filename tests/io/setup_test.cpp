@@ -166,6 +166,13 @@ TEST_F(SetupTest, FlagReportsFoundAndAbsent) {
   SktReadKeyword("start_time", second, {}, {.param = 2, .flag = &flag});
   EXPECT_EQ(second, 1);
   EXPECT_EQ(flag, 0);
+  // A missing parameter or instance of a present keyword is a read error.
+  SktReadKeyword("start_time", second, 4, {.param = 7, .flag = &flag});
+  EXPECT_EQ(flag, 1);
+  EXPECT_EQ(second, 4);
+  flag = 0;
+  SktReadKeyword("start_time", second, 4, {.instance = 2, .flag = &flag});
+  EXPECT_EQ(flag, 1);
   EXPECT_EQ(SktNumberOfParams("start_time"), 6);
   EXPECT_EQ(SktNumberOfParams("title"), 1);
   EXPECT_EQ(SktNumberOfParams("nothing"), 0);
@@ -314,28 +321,15 @@ TEST_P(BadValueTest, StopsOrSetsTheFlag) {
 INSTANTIATE_TEST_SUITE_P(
     Setup, BadValueTest,
     ::testing::Values(BadValue{"v = 30.0", 'i', "integer wanted, found 30.0"},
-                      BadValue{"v = true", 'i', "integer wanted, found true"},
                       BadValue{"v = 3000000000", 'i', "integer within the 32-bit range wanted, found 3000000000"},
                       BadValue{"v = \"30\"", 'd', "number wanted, found \"30\""},
                       BadValue{"v = inf", 'd', "finite number wanted, found inf"},
-                      BadValue{"v = nan", 'f', "finite single-precision number wanted, found nan"},
                       BadValue{"v = 1e300", 'f', "finite single-precision number wanted, found 1e+300"},
                       BadValue{"v = 0.5", 'b', "logical (true, false or an integer) wanted, found 0.5"},
                       BadValue{"v = 5", 's', "text wanted, found 5"},
                       BadValue{"v = [1, 2]", 'a', "3 value(s) wanted, found [1, 2]"},
                       BadValue{"v = [1, 2.5, 3]", 'a', "integer wanted as value 2, found 2.5"},
                       BadValue{"[VantorHD.TIME.v]", 'i', "value wanted, found a section"}));
-
-TEST_F(SetupTest, MissingParameterIsAReadError) {
-  Open("[VantorHD]\nv = [1, 2]\n");
-  SktOpenTarget("VantorHD");
-  int x = 0, flag = 0;
-  SktReadKeyword("v", x, 4, {.param = 3, .flag = &flag});
-  EXPECT_EQ(flag, 1);
-  EXPECT_EQ(x, 4);
-  SktReadKeyword("v", x, 4, {.instance = 2, .flag = &flag});
-  EXPECT_EQ(flag, 1);
-}
 
 TEST_F(SetupTest, UnreadableFileAndSyntaxError) {
   const std::string missing = dir.file("none.toml");

@@ -14,6 +14,7 @@
 #include "io/units.hpp"
 #include "io/zrn.hpp"
 #include "test_support.hpp"
+#include "zrn_support.hpp"
 
 namespace vhd {
 namespace {
@@ -81,49 +82,34 @@ TEST(ZrnRoundTrip, PointSeriesEquidistantCalendar) {
   ASSERT_EQ(zrnFileRead(r, name), 0);
   EXPECT_EQ(r.title, "Tide at the mouth");
   EXPECT_EQ(r.file_type, kZrnFileData);
-  int data_type = 0;
-  double dv = 0, x0 = 0, y0 = 0, orient = 1;
-  std::string proj;
-  zrnGetDataType(r, data_type);
-  zrnGetDeleteValFloat(r, dv);
-  zrnGetGeoInfoUTMProj(r, proj, x0, y0, orient);
-  EXPECT_EQ(data_type, 7);
-  EXPECT_EQ(dv, -999.0);
-  EXPECT_EQ(proj, "UTM-32");
-  EXPECT_EQ(x0, 500000.0);
-  EXPECT_EQ(y0, 6000000.0);
+  EXPECT_EQ(r.data_type, 7);
+  EXPECT_EQ(r.delete_value, -999.0);
+  EXPECT_EQ(r.projection, "UTM-32");
+  EXPECT_EQ(r.origin_x, 500000.0);
+  EXPECT_EQ(r.origin_y, 6000000.0);
   EXPECT_EQ(r.epsg, 32632);
   double b = 0;
   EXPECT_EQ(zrnGetCustomBlockValue(r, "VX7_Misc", 2, b), 0);
   EXPECT_EQ(b, -2.0);
-
-  int type = 0, nsteps = 0;
   ZrnDateTime start;
-  double dt = 0;
-  zrnGetTimeAxisType(r, type);
-  EXPECT_EQ(type, kZrnTimeEqCalendar);
+  double dt = 0, t4 = 0;
+  int nsteps = 0;
+  EXPECT_EQ(r.time.type, kZrnTimeEqCalendar);
   ASSERT_EQ(zrnGetEqCalendarAxis(r, start, dt, nsteps), 0);
   EXPECT_EQ(zrnDateTimeText(start), "2004-01-01 00:00:00");
   EXPECT_EQ(dt, 1800.0);
   EXPECT_EQ(nsteps, 5);
-  double t4 = 0;
   ASSERT_EQ(zrnGetStepTime(r, 4, t4), 0);
   EXPECT_EQ(t4, 7200.0);
-
-  int nitems = 0;
-  zrnGetNoOfItems(r, nitems);
-  ASSERT_EQ(nitems, 2);
-  std::string iname;
-  int itype = 0, unit = 0, vt = -1, axis = -9;
-  ASSERT_EQ(zrnGetItemInfo(r, 2, iname, itype, unit, vt), 0);
-  EXPECT_EQ(iname, "Discharge");
-  EXPECT_EQ(itype, kUvqIDischarge);
-  EXPECT_EQ(unit, kUvqUm3PerSec);
-  EXPECT_EQ(vt, kZrnMeanStepBackward);
-  zrnGetItemAxisType(r, 1, axis);
-  EXPECT_EQ(axis, kZrnAxisD0);
+  ASSERT_EQ(r.items.size(), 2u);
+  const ZrnItemInfo& q = r.items[1];
+  EXPECT_EQ(q.name, "Discharge");
+  EXPECT_EQ(q.item_type, kUvqIDischarge);
+  EXPECT_EQ(q.unit, kUvqUm3PerSec);
+  EXPECT_EQ(q.value_type, kZrnMeanStepBackward);
+  EXPECT_EQ(q.precision, kZrnDouble);
+  EXPECT_EQ(r.items[0].axis.type, kZrnAxisD0);
   EXPECT_EQ(r.items[0].var_name, "surface_elevation");
-  EXPECT_EQ(r.items[1].precision, kZrnDouble);
   ExpectSteps(r, 5);
   EXPECT_EQ(zrnFileClose(r), 0);
 }
@@ -131,12 +117,7 @@ TEST(ZrnRoundTrip, PointSeriesEquidistantCalendar) {
 TEST(ZrnRoundTrip, DeleteValuesStayDeleteValuesAndAreLeftOutOfStatistics) {
   test::TempDir dir;
   const std::string name = dir.file("gaps.zrn0");
-  ZrnFile w;
-  zrnHeaderCreate(w, name, kZrnFileData, "gaps");
-  zrnSetEqCalendarAxis(w, kStart, 60.0);
-  zrnSetItemInfo(w, 1, "Wind speed", kUvqIWindSpeed, kUvqUmeterPerSec);
-  zrnSetItemAxisEqD0(w, 1);
-  zrnFileCreate(w);
+  ZrnFile w = test::StartSeries(name, 1);
   for (double v : {3.0, kZrnDefaultDeleteValue, 7.0}) zrnWriteItemTimeStep(w, 0, &v, 1);
   EXPECT_EQ(w.items[0].minimum, 3.0);
   EXPECT_EQ(w.items[0].maximum, 7.0);
@@ -145,11 +126,7 @@ TEST(ZrnRoundTrip, DeleteValuesStayDeleteValuesAndAreLeftOutOfStatistics) {
   ZrnFile r;
   ASSERT_EQ(zrnFileRead(r, name), 0);
   double v[3];
-  for (double& x : v) {
-    int item;
-    double t;
-    ASSERT_EQ(zrnReadItemTimeStep(r, item, t, &x, 1), 0);
-  }
+  for (int s = 0; s < 3; ++s) ASSERT_EQ(ZrnReadItemAtStep(r, s, 1, &v[s], 1), 0);
   EXPECT_EQ(v[0], 3.0);
   EXPECT_EQ(static_cast<float>(v[1]), static_cast<float>(kZrnDefaultDeleteValue));
   EXPECT_EQ(v[2], 7.0);
@@ -179,9 +156,7 @@ TEST(ZrnRoundTrip, NonEquidistantAndRelativeAxes) {
 
     ZrnFile r;
     ASSERT_EQ(zrnFileRead(r, name), 0);
-    int type = 0;
-    zrnGetTimeAxisType(r, type);
-    EXPECT_EQ(type, c.type);
+    EXPECT_EQ(r.time.type, c.type);
     for (int s = 0; s < 4; ++s) {
       double t = 0;
       zrnGetStepTime(r, s, t);
@@ -196,110 +171,13 @@ TEST(ZrnRoundTrip, NonEquidistantAndRelativeAxes) {
       EXPECT_EQ(span, 100.0);
       EXPECT_EQ(n, 4);
     }
-    if (c.type == kZrnTimeEqRelative) {
-      double offset = 0, dt = 0;
-      int n = 0;
-      ASSERT_EQ(zrnGetEqTimeAxis(r, offset, dt, n), 0);
-      EXPECT_EQ(offset, 50.0);
-      EXPECT_EQ(dt, 20.0);
-    }
     ExpectSteps(r, 4);
     zrnFileClose(r);
   }
 }
 
-TEST(ZrnRoundTrip, LineAndGridFilesKeepTheirAxesAndLayout) {
-  test::TempDir dir;
-  // .zrn1: 4 points along x; .zrn2: 3 x 2 grid; .zrn3: 3 x 2 x 2 grid.
-  for (int kind = 1; kind <= 3; ++kind) {
-    const std::string name = dir.file("grid.zrn" + std::to_string(kind));
-    ZrnFile w;
-    ASSERT_EQ(zrnHeaderCreate(w, name, kZrnFileData, "grid"), 0);
-    zrnSetEqCalendarAxis(w, kStart, 3600.0);
-    for (int item = 1; item <= 2; ++item) {
-      zrnSetItemInfo(w, item, item == 1 ? "Depth" : "Current speed",
-                     item == 1 ? kUvqIWaterDepth : kUvqICurrentSpeed,
-                     item == 1 ? kUvqUmeter : kUvqUmeterPerSec);
-      if (kind == 1) { ASSERT_EQ(zrnSetItemAxisEqD1(w, item, 4, 100.0, 25.0), 0); }
-      if (kind == 2) { ASSERT_EQ(zrnSetItemAxisEqD2(w, item, 3, 2, 100.0, 200.0, 10.0, 20.0), 0); }
-      if (kind == 3) {
-        ASSERT_EQ(zrnSetItemAxisEqD3(w, item, 3, 2, 2, 100.0, 200.0, -5.0, 10.0, 20.0, 2.5), 0);
-      }
-      zrnItemEnableCompression(w, item, 5);
-    }
-    ASSERT_EQ(zrnFileCreate(w), 0);
-    ZrnItemInfo bathy;
-    bathy.name = "Bathymetry";
-    bathy.item_type = kUvqIBathymetry;
-    bathy.unit = kUvqUmeter;
-    bathy.axis = w.items[0].axis;
-    int sno = 0;
-    ASSERT_EQ(zrnStaticCreate(w, bathy, sno), 0);
-    const auto z = Record(9, 0, bathy.axis.Count());
-    ASSERT_EQ(zrnStaticWrite(w, sno, z.data(), static_cast<long>(z.size())), 0);
-    WriteSteps(w, 0, 3);
-    zrnFileClose(w);
-
-    ZrnFile r;
-    ASSERT_EQ(zrnFileRead(r, name), 0);
-    ZrnSpatialAxis a;
-    ASSERT_EQ(zrnGetItemDim(r, 2, a), 0);
-    EXPECT_EQ(a.type, kind);
-    EXPECT_EQ(a.n[0], kind == 1 ? 4 : 3);
-    EXPECT_EQ(a.x0[0], 100.0);
-    EXPECT_EQ(a.dx[0], kind == 1 ? 25.0 : 10.0);
-    if (kind >= 2) {
-      EXPECT_EQ(a.n[1], 2);
-      EXPECT_EQ(a.x0[1], 200.0);
-      EXPECT_EQ(a.dx[1], 20.0);
-    }
-    if (kind == 3) {
-      EXPECT_EQ(a.n[2], 2);
-      EXPECT_EQ(a.x0[2], -5.0);
-      EXPECT_EQ(a.dx[2], 2.5);
-    }
-    EXPECT_EQ(r.items[0].compression, 5);
-    int nstatics = 0;
-    zrnGetNoOfStatics(r, nstatics);
-    ASSERT_EQ(nstatics, 1);
-    ZrnItemInfo info;
-    ASSERT_EQ(zrnStaticRead(r, info), 0);
-    EXPECT_EQ(info.name, "Bathymetry");
-    EXPECT_EQ(info.item_type, kUvqIBathymetry);
-    std::vector<double> zr(z.size());
-    ASSERT_EQ(zrnStaticGetData(r, zr.data(), static_cast<long>(zr.size())), 0);
-    for (std::size_t i = 0; i < z.size(); ++i) EXPECT_NEAR(zr[i], z[i], 1e-4);
-    ExpectSteps(r, 3);
-    zrnFileClose(r);
-
-    if (kind == 2) {
-      // x runs fastest: value (j, i) of a record sits at j*nx + i, and the
-      // coordinate variables hold the cell centres.
-      int ncid, var, xv, yv;
-      ASSERT_EQ(nc_open(name.c_str(), NC_NOWRITE, &ncid), NC_NOERR);
-      ASSERT_EQ(nc_inq_varid(ncid, "current_speed", &var), NC_NOERR);
-      ASSERT_EQ(nc_inq_varid(ncid, "x", &xv), NC_NOERR);
-      ASSERT_EQ(nc_inq_varid(ncid, "y", &yv), NC_NOERR);
-      const size_t idx[3] = {1, 1, 2};
-      float v = 0;
-      ASSERT_EQ(nc_get_var1_float(ncid, var, idx, &v), NC_NOERR);
-      EXPECT_FLOAT_EQ(v, static_cast<float>(Value(2, 1, 1 * 3 + 2)));
-      double xs[3], ys[2];
-      nc_get_var_double(ncid, xv, xs);
-      nc_get_var_double(ncid, yv, ys);
-      EXPECT_EQ(xs[2], 120.0);
-      EXPECT_EQ(ys[1], 220.0);
-      int shuffle, deflate, level;
-      nc_inq_var_deflate(ncid, var, &shuffle, &deflate, &level);
-      EXPECT_EQ(deflate, 1);
-      EXPECT_EQ(level, 5);
-      nc_close(ncid);
-    }
-  }
-}
-
-// Writes a grid file of the axis's kind with one dynamic item over two steps
-// and a static item on the same grid.
+// Writes a grid file of the axis's kind with one compressed dynamic item over
+// two steps and a static item on the same grid.
 void WriteGridFile(const std::string& name, const ZrnSpatialAxis& a) {
   ZrnFile w;
   ASSERT_EQ(zrnHeaderCreate(w, name, kZrnFileData, "grid"), 0);
@@ -314,6 +192,7 @@ void WriteGridFile(const std::string& name, const ZrnSpatialAxis& a) {
                                  a.dx[1], a.dx[2]),
               0);
   }
+  zrnItemEnableCompression(w, 1, 5);
   ASSERT_EQ(zrnFileCreate(w), 0);
   ZrnItemInfo bed;
   bed.name = "Bed level";
@@ -348,15 +227,18 @@ ZrnSpatialAxis Grid(int type, std::array<int, 3> n, std::array<double, 3> x0,
   return a;
 }
 
-// A single-cell axis has no second coordinate value to give its spacing; a
-// descending axis (rasters from north to south, layers from the top down) has
-// a negative one. Both come back exactly, for dynamic and static items.
-TEST(ZrnRoundTrip, SingleCellAndDescendingAxesKeepTheirSpacing) {
+// Line and grid files keep their axes for dynamic and static items, also a
+// single cell (no second coordinate value to give the spacing) and a
+// descending axis (rasters from north to south, layers from the top down).
+TEST(ZrnRoundTrip, LineAndGridFilesKeepTheirAxesAndLayout) {
   test::TempDir dir;
   const struct {
     const char* file;
     ZrnSpatialAxis axis;
   } cases[] = {
+      {"line.zrn1", Grid(kZrnAxisD1, {4, 1, 1}, {100.0, 0, 0}, {25.0, 1, 1})},
+      {"grid.zrn2", Grid(kZrnAxisD2, {3, 2, 1}, {100.0, 200.0, 0}, {10.0, 20.0, 1})},
+      {"grid.zrn3", Grid(kZrnAxisD3, {3, 2, 2}, {100.0, 200.0, -5.0}, {10.0, 20.0, 2.5})},
       {"point_line.zrn1", Grid(kZrnAxisD1, {1, 1, 1}, {500.0, 0, 0}, {25.0, 1, 1})},
       {"column.zrn2", Grid(kZrnAxisD2, {1, 3, 1}, {100.0, 200.0, 0}, {10.0, 20.0, 1})},
       {"row.zrn2", Grid(kZrnAxisD2, {3, 1, 1}, {100.0, 200.0, 0}, {10.0, 20.0, 1})},
@@ -374,8 +256,14 @@ TEST(ZrnRoundTrip, SingleCellAndDescendingAxesKeepTheirSpacing) {
     ZrnSpatialAxis a;
     ASSERT_EQ(zrnGetItemDim(r, 1, a), 0);
     ExpectAxis(a, c.axis);
+    EXPECT_EQ(r.items[0].compression, 5);
+    int nstatics = 0;
+    zrnGetNoOfStatics(r, nstatics);
+    ASSERT_EQ(nstatics, 1);
     ZrnItemInfo info;
     ASSERT_EQ(zrnStaticRead(r, info), 0);
+    EXPECT_EQ(info.name, "Bed level");
+    EXPECT_EQ(info.item_type, kUvqIBathymetry);
     ExpectAxis(info.axis, c.axis);
     std::vector<double> z(static_cast<size_t>(info.axis.Count()));
     ASSERT_EQ(zrnStaticGetData(r, z.data(), static_cast<long>(z.size())), 0);
@@ -384,12 +272,32 @@ TEST(ZrnRoundTrip, SingleCellAndDescendingAxesKeepTheirSpacing) {
     zrnFileClose(r);
   }
 
+  // x runs fastest: value (j, i) of a record sits at j*nx + i, and the
+  // coordinate variables hold the cell centres.
+  int ncid, var, xv, yv;
+  ASSERT_EQ(nc_open(dir.file("grid.zrn2").c_str(), NC_NOWRITE, &ncid), NC_NOERR);
+  ASSERT_EQ(nc_inq_varid(ncid, "depth", &var), NC_NOERR);
+  ASSERT_EQ(nc_inq_varid(ncid, "x", &xv), NC_NOERR);
+  ASSERT_EQ(nc_inq_varid(ncid, "y", &yv), NC_NOERR);
+  const size_t idx[3] = {1, 1, 2};
+  double v = 0;
+  ASSERT_EQ(nc_get_var1_double(ncid, var, idx, &v), NC_NOERR);
+  EXPECT_EQ(v, Value(1, 1, 1 * 3 + 2));
+  double xs[3], ys[4];
+  nc_get_var_double(ncid, xv, xs);
+  nc_get_var_double(ncid, yv, ys);
+  EXPECT_EQ(xs[2], 120.0);
+  EXPECT_EQ(ys[1], 220.0);
+  int shuffle, deflate, level;
+  nc_inq_var_deflate(ncid, var, &shuffle, &deflate, &level);
+  EXPECT_EQ(deflate, 1);
+  EXPECT_EQ(level, 5);
+  nc_close(ncid);
+
   // The coordinate values of a descending axis descend (what other readers
   // see), and the axis is kept as numbers, never as strings.
-  int ncid, yv;
   ASSERT_EQ(nc_open(dir.file("north_south.zrn2").c_str(), NC_NOWRITE, &ncid), NC_NOERR);
   ASSERT_EQ(nc_inq_varid(ncid, "y", &yv), NC_NOERR);
-  double ys[4];
   ASSERT_EQ(nc_get_var_double(ncid, yv, ys), NC_NOERR);
   EXPECT_EQ(ys[0], 260.0);
   EXPECT_EQ(ys[3], 200.0);
@@ -427,36 +335,7 @@ TEST(ZrnRoundTrip, CoordinateValuesChangedByAnotherToolWinOverTheStoredAxis) {
 //                                     | \ | q |
 //                                     1---2---3
 ZrnMeshData SmallMesh() {
-  ZrnMeshData m;
-  const double xs[] = {0, 1, 2, 0, 1, 2}, ys[] = {0, 0, 0, 1, 1, 1};
-  m.x.assign(6);
-  m.y.assign(6);
-  m.z.assign(6);
-  m.node_id.assign(6);
-  m.node_code.assign(6);
-  for (int i = 1; i <= 6; ++i) {
-    m.x[i] = 1000.0 + xs[i - 1];
-    m.y[i] = 2000.0 + ys[i - 1];
-    m.z[i] = -1.0 - 0.5 * i;
-    m.node_id[i] = 10 + i;
-    m.node_code[i] = i == 5 ? 0 : 1;
-  }
-  const std::vector<std::vector<int>> elems = {{1, 2, 4}, {2, 5, 4}, {2, 3, 6, 5}};
-  m.element_id.assign(3);
-  m.element_type.assign(3);
-  m.node_start.assign(4);
-  m.node_start[1] = 1;
-  std::vector<int> list;
-  for (int e = 1; e <= 3; ++e) {
-    const auto& en = elems[static_cast<size_t>(e - 1)];
-    m.element_id[e] = 100 + e;
-    m.element_type[e] = en.size() == 3 ? 21 : 25;
-    m.node_start[e + 1] = m.node_start[e] + static_cast<int>(en.size());
-    list.insert(list.end(), en.begin(), en.end());
-  }
-  m.node_list.assign(static_cast<int>(list.size()));
-  for (int j = 1; j <= m.node_list.size(); ++j) m.node_list[j] = list[static_cast<size_t>(j - 1)];
-  return m;
+  return test::MakeZrnMesh({0, 1, 2, 0, 1, 2}, {0, 0, 0, 1, 1, 1}, 1000.0, 2000.0, {{1, 2, 4}, {2, 5, 4}, {2, 3, 6, 5}});
 }
 
 TEST(ZrnRoundTrip, MeshFileWithFaceAndNodeItems) {
@@ -496,22 +375,19 @@ TEST(ZrnRoundTrip, MeshFileWithFaceAndNodeItems) {
     EXPECT_EQ(m.z[i], mesh.z[i]);
     EXPECT_EQ(m.node_id[i], mesh.node_id[i]);
     EXPECT_EQ(m.node_code[i], mesh.node_code[i]);
+    if (i <= 4) { EXPECT_EQ(m.node_start[i], mesh.node_start[i]); }
+    if (i <= 3) {
+      EXPECT_EQ(m.element_id[i], mesh.element_id[i]);
+      EXPECT_EQ(m.element_type[i], mesh.element_type[i]);
+    }
   }
-  for (int e = 1; e <= 4; ++e) EXPECT_EQ(m.node_start[e], mesh.node_start[e]);
   for (int j = 1; j <= mesh.node_list.size(); ++j) EXPECT_EQ(m.node_list[j], mesh.node_list[j]);
-  for (int e = 1; e <= 3; ++e) {
-    EXPECT_EQ(m.element_id[e], mesh.element_id[e]);
-    EXPECT_EQ(m.element_type[e], mesh.element_type[e]);
-  }
   EXPECT_DOUBLE_EQ(m.face_x[3], 1001.5);
   EXPECT_DOUBLE_EQ(m.face_y[3], 2000.5);
-  ZrnSpatialAxis a;
-  zrnGetItemDim(r, 1, a);
-  EXPECT_EQ(a.type, kZrnAxisD4);
-  EXPECT_EQ(a.location, kZrnLocationFace);
-  zrnGetItemDim(r, 2, a);
-  EXPECT_EQ(a.location, kZrnLocationNode);
-  EXPECT_EQ(a.n[0], 6);
+  EXPECT_EQ(r.items[0].axis.type, kZrnAxisD4);
+  EXPECT_EQ(r.items[0].axis.location, kZrnLocationFace);
+  EXPECT_EQ(r.items[1].axis.location, kZrnLocationNode);
+  EXPECT_EQ(r.items[1].axis.n[0], 6);
   ExpectSteps(r, 2);
   zrnFileClose(r);
 
@@ -546,14 +422,7 @@ TEST(ZrnRoundTrip, MeshItemsMustFitTheMesh) {
 TEST(ZrnRoundTrip, AppendContinuesTheTimeAxis) {
   test::TempDir dir;
   const std::string name = dir.file("append.zrn0");
-  ZrnFile w;
-  zrnHeaderCreate(w, name, kZrnFileData, "append");
-  zrnSetEqCalendarAxis(w, kStart, 60.0);
-  zrnSetItemInfo(w, 1, "A", kUvqIWaterLevel, kUvqUmeter);
-  zrnSetItemAxisEqD0(w, 1);
-  zrnSetItemInfo(w, 2, "B", kUvqIWaterLevel, kUvqUmeter);
-  zrnSetItemAxisEqD0(w, 2);
-  zrnFileCreate(w);
+  ZrnFile w = test::StartSeries(name, 2);
   WriteSteps(w, 0, 2);
   zrnFileClose(w);
 
@@ -638,20 +507,10 @@ TEST(ZrnRoundTrip, FindAndSkipPositionTheReader) {
   zrnFileClose(r);
 }
 
-ZrnFile StartSeries(const std::string& name) {
-  ZrnFile w;
-  zrnHeaderCreate(w, name, kZrnFileData, "live");
-  zrnSetEqCalendarAxis(w, kStart, 60.0);
-  zrnSetItemInfo(w, 1, "Level", kUvqIWaterLevel, kUvqUmeter, kZrnDouble);
-  zrnSetItemAxisEqD0(w, 1);
-  zrnFileCreate(w, true);
-  return w;
-}
-
 TEST(ZrnRoundTrip, ASecondRecordInTheSameProcessReadsAFileBeingWritten) {
   test::TempDir dir;
   const std::string name = dir.file("live.zrn0");
-  ZrnFile w = StartSeries(name);
+  ZrnFile w = test::StartSeries(name, 1, kZrnDouble);
   WriteSteps(w, 0, 3);
   ZrnFile r;
   ASSERT_EQ(zrnFileRead(r, name), 0);
@@ -667,7 +526,7 @@ TEST(ZrnRoundTrip, FlushedStepsSurviveACrashOfTheWriter) {
   const pid_t pid = fork();
   ASSERT_GE(pid, 0);
   if (pid == 0) {
-    ZrnFile w = StartSeries(name);
+    ZrnFile w = test::StartSeries(name, 1, kZrnDouble);
     for (int s = 0; s < 3; ++s) {
       const double v = Value(1, s, 0);
       zrnWriteItemTimeStep(w, 0, &v, 1);
@@ -713,9 +572,7 @@ TEST(ZrnRoundTrip, PlainCfSeriesReadsWithDefaults) {
 
   ZrnFile r;
   ASSERT_EQ(zrnFileRead(r, name), 0);
-  int type = 0;
-  zrnGetTimeAxisType(r, type);
-  EXPECT_EQ(type, kZrnTimeNeqCalendar);
+  EXPECT_EQ(r.time.type, kZrnTimeNeqCalendar);
   EXPECT_EQ(zrnDateTimeText(r.time.start), "2020-03-01 07:00:00");
   double t2 = 0;
   zrnGetStepTime(r, 2, t2);

@@ -15,11 +15,9 @@ TEST(ZrnUnits, KeysTheEngineRelyOn) {
   EXPECT_EQ(uvqGetItemTypeIdent(100079), "uvqIBathymetry");
   EXPECT_EQ(uvqGetItemUserUnit(100079), 1000);
   EXPECT_EQ(uvqGetItemTypeIdent(999), "uvqIItemUndefined");
-  EXPECT_EQ(uvqGetUnitIdent(0), "uvqUUnitUndefined");
   EXPECT_TRUE(uvqItemUnitEqv(100007, 2200));   // concentration in g/m3
   EXPECT_TRUE(uvqItemUnitEqv(100201, 99000));  // component concentration, no unit
   EXPECT_FALSE(uvqItemUnitEqv(100201, 2200));
-  EXPECT_EQ(uvqGetItemTypeIdent(123456), "uvqIItemUndefined");
   EXPECT_EQ(uvqGetUnitIdent(77), "uvqUUnitUndefined");
   EXPECT_FALSE(uvqIsUnit(77));
 }
@@ -50,9 +48,7 @@ TEST(ZrnUnits, LookupByIdentNameAndUdunits) {
   EXPECT_EQ(uvqGetUnitKey("m s-1"), kUvqUmeterPerSec);
   EXPECT_EQ(uvqGetUnitKey("m/s"), kUvqUmeterPerSec);
   EXPECT_EQ(uvqGetUnitKey(" degC "), kUvqUdegreeCelsius);
-  EXPECT_EQ(uvqGetUnitKey("K"), kUvqUkelvin);
   EXPECT_EQ(uvqGetUnitKey("metres"), kUvqUmeter);
-  EXPECT_EQ(uvqGetUnitKey("hPa"), kUvqUhectopascal);
   EXPECT_EQ(uvqGetUnitKey("furlongs"), kUvqUnitUndefined);
   EXPECT_EQ(uvqGetItemTypeKey("water level"), kUvqIWaterLevel);
   EXPECT_EQ(uvqGetItemTypeKey("uvqIGeographicalCoordinate"), kUvqIGeographicalCoordinate);

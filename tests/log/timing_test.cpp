@@ -12,33 +12,24 @@
 namespace vhd {
 namespace {
 
-std::vector<std::string> Body(const std::string& path) {
-  std::vector<std::string> lines;
-  std::istringstream in(test::ReadTextFile(path));
-  for (std::string line; std::getline(in, line);) lines.push_back(line);
-  lines.erase(lines.begin(), lines.begin() + 2);
-  return lines;
-}
-
-void Spin(double seconds) {
-  const double end = WallSeconds() + seconds;
-  volatile double sink = 0;
-  while (WallSeconds() < end) sink = sink + 1.0;
-}
+// A fresh log; Body() gives its lines after the two header lines.
+class TimingLog : public ::testing::Test {
+protected:
+  void SetUp() override { ASSERT_TRUE(OpenLogFile(log)); }
+  void TearDown() override { CloseLogFile(); }
+  std::vector<std::string> Body() {
+    CloseLogFile();
+    std::vector<std::string> lines;
+    std::istringstream in(test::ReadTextFile(log));
+    for (std::string line; std::getline(in, line);) lines.push_back(line);
+    lines.erase(lines.begin(), lines.begin() + 2);
+    return lines;
+  }
+  test::TempDir dir;
+  std::string log = dir.file("t.log");
+};
 
 const std::string kRule = "  " + std::string(66, '-');
-
-TEST(Timing, InitNamesTimersAndAddRecordsOrder) {
-  TimingSet set;
-  InitTiming(set, "Overall", 4);
-  ASSERT_EQ(set.timers.size(), 4u);
-  EXPECT_EQ(set.timers[2].name, "task_3");
-  EXPECT_TRUE(set.order.empty());
-  AddTiming(set, 3, "Post-processing");
-  AddTiming(set, 1, "Pre-processing");
-  EXPECT_EQ(set.order, (std::vector<int>{3, 1}));
-  EXPECT_EQ(set.timers[2].name, "Post-processing");
-}
 
 TEST(Timing, ClocksAccumulateOverIntervals) {
   TimingSet set;
@@ -46,7 +37,9 @@ TEST(Timing, ClocksAccumulateOverIntervals) {
   AddTiming(set, 1, "Calculation");
   for (int i = 0; i < 2; ++i) {
     StartTiming(set, 1);
-    Spin(0.02);
+    const double end = WallSeconds() + 0.02;
+    volatile double sink = 0;
+    while (WallSeconds() < end) sink = sink + 1.0;
     StopTiming(set, 1);
   }
   const Timing& t = set.timers[0];
@@ -59,33 +52,17 @@ TEST(Timing, ClocksAccumulateOverIntervals) {
   EXPECT_EQ(set.timers[1].wall_total, 0.0);
 }
 
-TEST(Timing, ClocksNeverGoBack) {
-  double last = WallSeconds();
-  for (int i = 0; i < 1000; ++i) {
-    const double now = WallSeconds();
-    ASSERT_GE(now, last);
-    last = now;
-  }
-}
-
-TEST(Timing, WrongNumbersAreFatal) {
-  test::TempDir dir;
-  const std::string log = dir.file("t.log");
-  ASSERT_TRUE(OpenLogFile(log));
+TEST_F(TimingLog, WrongNumbersAreFatal) {
   TimingSet set;
   EXPECT_EXIT(InitTiming(set, "Bad", 0), testing::ExitedWithCode(1), "");
-  EXPECT_EQ(Body(log)[1], "Fatal error: InitTiming: Wrong number of timings");
+  EXPECT_EQ(Body()[1], "Fatal error: InitTiming: Wrong number of timings");
   InitTiming(set, "Overall", 4);
   ASSERT_TRUE(OpenLogFile(log));
   EXPECT_EXIT(AddTiming(set, 5, "Too far"), testing::ExitedWithCode(1), "");
-  EXPECT_EQ(Body(log)[1], "Fatal error: AddTiming: Wrong timing number");
-  CloseLogFile();
+  EXPECT_EQ(Body()[1], "Fatal error: AddTiming: Wrong timing number");
 }
 
-TEST(Timing, TableLayoutWithRuleAboveTotal) {
-  test::TempDir dir;
-  const std::string log = dir.file("t.log");
-  ASSERT_TRUE(OpenLogFile(log));
+TEST_F(TimingLog, TableLayoutWithRuleAboveTotal) {
   TimingSet set;
   InitTiming(set, "Overall  ", 4);
   AddTiming(set, 1, "Pre-processing");
@@ -96,8 +73,7 @@ TEST(Timing, TableLayoutWithRuleAboveTotal) {
   set.timers[1].cpu_total = 1234.567;
   set.timers[1].wall_total = 0.004;
   PrintTimings(set);
-  CloseLogFile();
-  const std::vector<std::string> body = Body(log);
+  const std::vector<std::string> body = Body();
   ASSERT_EQ(body.size(), 12u);
   EXPECT_EQ(body[1], std::string(26, '=') + " Overall Timings " + std::string(27, '='));
   EXPECT_EQ(body[2], kRule);
@@ -112,34 +88,26 @@ TEST(Timing, TableLayoutWithRuleAboveTotal) {
   EXPECT_EQ(body[11], std::string(70, '='));
 }
 
-TEST(Timing, CountLimitsTheRowsAndZeroPrintsNothing) {
-  test::TempDir dir;
-  const std::string log = dir.file("t.log");
-  ASSERT_TRUE(OpenLogFile(log));
+TEST_F(TimingLog, CountLimitsTheRowsAndZeroPrintsNothing) {
   TimingSet set;
   InitTiming(set, "MPI Communication", 9);
   PrintTimings(set);
   AddTiming(set, 4, "Halo data");
   AddTiming(set, 5, "Additional data");
   PrintTimings(set, 1);
-  CloseLogFile();
-  const std::vector<std::string> body = Body(log);
+  const std::vector<std::string> body = Body();
   ASSERT_EQ(body.size(), 9u);
   EXPECT_EQ(body[5].substr(0, 11), "  Halo data");
 }
 
-TEST(EndOfRun, MemoryAndPerformanceBlocks) {
+TEST_F(TimingLog, MemoryAndPerformanceBlocks) {
   EXPECT_GT(PeakMemoryMiB(), 0.0);
-  test::TempDir dir;
-  const std::string log = dir.file("t.log");
-  ASSERT_TRUE(OpenLogFile(log));
   PrintMemoryUsage(0.0);
   PrintMemoryUsage(12.345);
   PrintMemoryUsage(100.0, 2048.5);
   PrintPerformance(4);
   PrintPerformance(8, {0, 1}, false);
-  CloseLogFile();
-  const std::vector<std::string> b = Body(log);
+  const std::vector<std::string> b = Body();
   ASSERT_EQ(b.size(), 23u);
   EXPECT_EQ(b[1], std::string(28, '=') + " Memory Usage " + std::string(28, '='));
   EXPECT_EQ(b[2], "  Peak memory usage (MB)" + std::string(34, ' ') + "     12.35");

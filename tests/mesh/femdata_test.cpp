@@ -9,7 +9,6 @@
 #include <gtest/gtest.h>
 
 #include <cmath>
-#include <cstdio>
 #include <functional>
 #include <string>
 #include <vector>
@@ -18,32 +17,13 @@
 #include "log/log.hpp"
 #include "mesh/cartography.hpp"
 #include "mesh/generate.hpp"
-#include "test_support.hpp"
+#include "mesh/read_mesh.hpp"
+#include "mesh_support.hpp"
 
 namespace vhd {
 namespace {
 
 constexpr ZrnDateTime kStart{2010, 6, 1, 0, 0, 0};
-
-// Runs a statement that must end the run with status 1, its standard output
-// going to a file.
-#define EXPECT_STOP_OUTPUT(statement, out_file)        \
-  EXPECT_EXIT(                                         \
-      {                                                \
-        std::freopen((out_file).c_str(), "w", stdout); \
-        statement;                                     \
-      },                                               \
-      testing::ExitedWithCode(1), "")
-
-// The output with the continuation lines of wrapped messages joined.
-std::string Joined(const std::string& path) {
-  std::string text = test::ReadTextFile(path);
-  for (const std::string indent : {"\n              ", "\n             "}) {
-    for (auto p = text.find(indent); p != std::string::npos; p = text.find(indent))
-      text.erase(p, indent.size());
-  }
-  return text;
-}
 
 struct ItemDef {
   std::string name;
@@ -107,22 +87,15 @@ FemDataRequest Request(FemDataExpect expect, FemDataLocation location, const Mes
   return r;
 }
 
-RectangleMeshSpec Rectangle(double x0, double x1, double y0, double y1, int nx, int ny) {
-  RectangleMeshSpec s;
-  s.x0 = x0;
-  s.x1 = x1;
-  s.y0 = y0;
-  s.y1 = y1;
-  s.nx = nx;
-  s.ny = ny;
-  return s;
+// Opens a copy of spec for a run from kStart (for the refusals).
+void Open(DataSpec spec, const FemDataRequest& request, double duration = 600.0) {
+  FemDataOpen(spec, request, kStart, duration);
 }
 
 class FemDataTest : public ::testing::Test {
  protected:
   void TearDown() override { CloseLogFile(); }
   test::TempDir dir;
-  std::string out = dir.file("stdout.txt");
 };
 
 // ---- point series ------------------------------------------------------------------------
@@ -165,9 +138,7 @@ TEST_F(FemDataTest, SoftStartAndTheTargetsOfAPointSeries) {
   d.values = [](int, int s) { return std::vector<double>{2.0 + s}; };
   const std::string name = dir.file("ramp.zrn0");
   WriteFile(name, d);
-  Mesh mesh;
-  GenerateRectangleMesh(Rectangle(0.0, 1.0, 0.0, 1.0, 3, 2), mesh);
-  SetupMeshGeometry(mesh);
+  const Mesh mesh = test::Built(test::Rectangle(0.0, 1.0, 0.0, 1.0, 3, 2));
 
   DataSpec spec = FileSpec(kDataFile, name);
   spec.type_of_soft_start = kSoftStartSine;
@@ -236,25 +207,14 @@ TEST_F(FemDataTest, SeriesThatDoNotCoverTheRunAreRefused) {
   d.values = [](int, int s) { return std::vector<double>{1.0 * s}; };
   const std::string early = dir.file("early.zrn0");
   WriteFile(early, d);
-  EXPECT_STOP_OUTPUT(
-      {
-        DataSpec s = FileSpec(kDataFile, early);
-        FemDataOpen(s, FemDataRequest{}, kStart, 1.0);
-      },
-      out);
-  EXPECT_NE(Joined(out).find("The data does not cover the entire simulation"), std::string::npos)
-      << Joined(out);
+  EXPECT_FATAL(Open(FileSpec(kDataFile, early), FemDataRequest{}, 1.0),
+               "The data does not cover the entire simulation");
   d.start = 1.0;
   d.nsteps = 20;
   const std::string late = dir.file("late.zrn0");
   WriteFile(late, d);
-  EXPECT_STOP_OUTPUT(
-      {
-        DataSpec s = FileSpec(kDataFileMap, late);
-        FemDataOpen(s, FemDataRequest{}, kStart, 2.0);
-      },
-      out);
-  EXPECT_NE(Joined(out).find("The data does not cover the entire simulation"), std::string::npos);
+  EXPECT_FATAL(Open(FileSpec(kDataFileMap, late), FemDataRequest{}, 2.0),
+               "The data does not cover the entire simulation");
   // Format 2 is not checked: it takes the data at the start (here the first step).
   DataSpec once = FileSpec(kDataFileOnce, late);
   FemDataOpen(once, FemDataRequest{}, kStart, 100.0);
@@ -268,16 +228,8 @@ TEST_F(FemDataTest, OneStepFiles) {
   d.values = [](int, int) { return std::vector<double>{4.25}; };
   const std::string name = dir.file("one.zrn0");
   WriteFile(name, d);
-  EXPECT_STOP_OUTPUT(
-      {
-        DataSpec s = FileSpec(kDataFile, name);
-        FemDataOpen(s, FemDataRequest{}, kStart, 60.0);
-      },
-      out);
-  EXPECT_NE(Joined(out).find(
-                "The data does not cover the entire simulation - only one time step in file"),
-            std::string::npos)
-      << Joined(out);
+  EXPECT_FATAL(Open(FileSpec(kDataFile, name), FemDataRequest{}, 60.0),
+               "The data does not cover the entire simulation - only one time step in file");
   DataSpec instant = FileSpec(kDataFile, name);
   FemDataOpen(instant, FemDataRequest{}, kStart, 0.0);
   EXPECT_EQ(FemDataValue(instant, 1, 0.0), 4.25);
@@ -295,12 +247,7 @@ double Linear(int step, double x, double y) {
 }
 
 TEST_F(FemDataTest, BilinearGridReproducesALinearFieldEverywhere) {
-  Mesh mesh;
-  RectangleMeshSpec ms = Rectangle(100.0, 900.0, 50.0, 650.0, 9, 7);
-  ms.layout = CellLayout::kMixed;
-  ms.jitter = 0.2;
-  GenerateRectangleMesh(ms, mesh);
-  SetupMeshGeometry(mesh);
+  const Mesh mesh = test::Built(test::Rectangle(100.0, 900.0, 50.0, 650.0, 9, 7, CellLayout::kMixed, 0.2));
   // A grid larger than the mesh, with other spacings in x and y.
   const int nx = 14, ny = 9;
   const double gx0 = 60.0, gy0 = 0.0, gdx = 70.0, gdy = 85.0;
@@ -352,11 +299,9 @@ TEST_F(FemDataTest, GridInAnotherProjectionIsReadThroughGeographicCoordinates) {
   // A UTM zone 32 mesh near 9 E, 55 N and a geographic grid holding the
   // longitude and the latitude: read at the element centres they must give the
   // centres' own geographic coordinates (to the bilinear error of a smooth map).
-  Mesh mesh;
-  RectangleMeshSpec ms = Rectangle(480000.0, 520000.0, 6090000.0, 6130000.0, 6, 6);
+  RectangleMeshSpec ms = test::Rectangle(480000.0, 520000.0, 6090000.0, 6130000.0, 6, 6);
   ms.projection = "UTM-32";
-  GenerateRectangleMesh(ms, mesh);
-  SetupMeshGeometry(mesh);
+  const Mesh mesh = test::Built(ms);
   const int nx = 41, ny = 41;
   const double lon0 = 8.5, lat0 = 54.8, step = 0.025;
   FileDef d;
@@ -412,11 +357,9 @@ TEST_F(FemDataTest, DeleteValuesTakeNoPartInTheWeights) {
 // ---- lines ---------------------------------------------------------------------------------
 
 TEST_F(FemDataTest, LineValuesSpreadAlongTheBoundary) {
-  Mesh mesh;
-  RectangleMeshSpec ms = Rectangle(0.0, 300.0, 0.0, 1000.0, 3, 8);
+  RectangleMeshSpec ms = test::Rectangle(0.0, 300.0, 0.0, 1000.0, 3, 8);
   ms.code_east = 2;
-  GenerateRectangleMesh(ms, mesh);
-  SetupMeshGeometry(mesh);
+  const Mesh mesh = test::Built(ms);
   MeshSection section;
   SetupMeshSection(mesh, 2, section);
   FileDef d;
@@ -440,47 +383,16 @@ TEST_F(FemDataTest, LineValuesSpreadAlongTheBoundary) {
 
 // ---- mesh files ------------------------------------------------------------------------------
 
-ZrnMeshData ToZrnMesh(const Mesh& m) {
-  ZrnMeshData z;
-  const int nn = m.nodes.nnodes, ne = m.elements.nelements;
-  z.x.assign(nn);
-  z.y.assign(nn);
-  z.z.assign(nn);
-  z.node_id.assign(nn);
-  z.node_code.assign(nn);
-  for (int i = 1; i <= nn; ++i) {
-    z.x[i] = m.nodes.x[i];
-    z.y[i] = m.nodes.y[i];
-    z.z[i] = m.nodes.z[i];
-    z.node_id[i] = m.nodes.id[i];
-    z.node_code[i] = m.nodes.code[i];
-  }
-  z.element_id.assign(ne);
-  z.element_type.assign(ne);
-  z.node_start.assign(ne + 1);
-  z.node_start[1] = 1;
-  std::vector<int> list;
-  for (int e = 1; e <= ne; ++e) {
-    z.element_id[e] = m.elements.id[e];
-    z.element_type[e] = m.elements.type[e];
-    const int n = ElementNodeCount(m.elements, e);
-    z.node_start[e + 1] = z.node_start[e] + n;
-    for (int j = 1; j <= n; ++j) list.push_back(ElementNode(m.elements, e, j));
-  }
-  z.node_list.assign(static_cast<int>(list.size()));
-  for (int j = 1; j <= z.node_list.size(); ++j)
-    z.node_list[j] = list[static_cast<std::size_t>(j - 1)];
-  return z;
-}
-
 class FemDataMeshFile : public FemDataTest {
  protected:
   void SetUp() override {
-    RectangleMeshSpec ms = Rectangle(0.0, 400.0, 0.0, 300.0, 4, 3);
-    ms.layout = CellLayout::kMixed;
-    GenerateRectangleMesh(ms, mesh);
-    SetupMeshGeometry(mesh);
-    zmesh = ToZrnMesh(mesh);
+    mesh = test::Built(test::Rectangle(0.0, 400.0, 0.0, 300.0, 4, 3, CellLayout::kMixed));
+    // The mesh as a data file holds it: through a mesh file of its own.
+    WriteMeshZrnu(mesh, dir.file("mesh.zrnu"));
+    ZrnFile mf;
+    ZrnOpenInput(mf, dir.file("mesh.zrnu"));
+    zrnReadMesh(mf, zmesh);
+    zrnHeaderDestroy(mf);
     FileDef d;
     d.file_type = kZrnFileMesh2D;
     d.mesh = &zmesh;
@@ -561,35 +473,18 @@ TEST_F(FemDataMeshFile, NodeItemOntoNodesElementsAndPoints) {
 }
 
 TEST_F(FemDataMeshFile, AnotherMeshOrAWrongUnitIsRefused) {
-  Mesh other;
-  GenerateRectangleMesh(Rectangle(0.0, 1.0, 0.0, 1.0, 5, 3), other);
-  SetupMeshGeometry(other);
-  EXPECT_STOP_OUTPUT(
-      {
-        DataSpec s = FileSpec(kDataFile, name);
-        FemDataOpen(s, Request(FemDataExpect::kMesh, FemDataLocation::kElements, &other), kStart,
-                    600.0);
-      },
-      out);
-  EXPECT_NE(Joined(out).find("Fatal error: Wrong data file: "), std::string::npos) << Joined(out);
-  EXPECT_STOP_OUTPUT(
-      {
-        DataSpec s = FileSpec(kDataFile, name);
-        FemDataRequest r = Request(FemDataExpect::kMesh, FemDataLocation::kElements, &mesh);
-        r.item_types = {kUvqIDischarge};
-        FemDataOpen(s, r, kStart, 600.0);
-      },
-      out);
-  EXPECT_NE(Joined(out).find("does not have the required unit type"), std::string::npos)
-      << Joined(out);
+  const Mesh other = test::Built(test::Rectangle(0.0, 1.0, 0.0, 1.0, 5, 3));
+  EXPECT_FATAL(Open(FileSpec(kDataFile, name), Request(FemDataExpect::kMesh, FemDataLocation::kElements, &other)),
+               "Fatal error: Wrong data file: ");
+  FemDataRequest discharge = Request(FemDataExpect::kMesh, FemDataLocation::kElements, &mesh);
+  discharge.item_types = {kUvqIDischarge};
+  EXPECT_FATAL(Open(FileSpec(kDataFile, name), discharge), "does not have the required unit type");
 }
 
 // ---- files of the wrong kind -------------------------------------------------------------------
 
 TEST_F(FemDataTest, FilesOfTheWrongKindAreRefusedWithTheirMessages) {
-  Mesh mesh;
-  GenerateRectangleMesh(Rectangle(0.0, 1.0, 0.0, 1.0, 2, 2), mesh);
-  SetupMeshGeometry(mesh);
+  const Mesh mesh = test::Built(test::Rectangle(0.0, 1.0, 0.0, 1.0, 2, 2));
   FileDef point;
   point.values = [](int, int) { return std::vector<double>{1.0}; };
   const std::string zrn0 = dir.file("p.zrn0");
@@ -622,22 +517,12 @@ TEST_F(FemDataTest, FilesOfTheWrongKindAreRefusedWithTheirMessages) {
       {dir.file("p.dat"), FemDataExpect::kPoint, 1, "Illegal data file"},
   };
   for (const Case& c : cases) {
-    EXPECT_STOP_OUTPUT(
-        {
-          DataSpec s = FileSpec(kDataFile, c.file, 1, {c.item});
-          FemDataOpen(s, Request(c.expect, FemDataLocation::kElements, &mesh), kStart, 600.0);
-        },
-        out);
-    EXPECT_NE(Joined(out).find("Fatal error: " + c.message + ": "), std::string::npos)
-        << Joined(out);
+    SCOPED_TRACE(c.message);
+    EXPECT_FATAL(Open(FileSpec(kDataFile, c.file, 1, {c.item}), Request(c.expect, FemDataLocation::kElements, &mesh)),
+                 "Fatal error: " + c.message + ": ");
   }
-  EXPECT_STOP_OUTPUT(
-      {
-        DataSpec s = FileSpec(kDataFile, zrn2);
-        FemDataOpen(s, Request(FemDataExpect::kGrid, FemDataLocation::kElements), kStart, 600.0);
-      },
-      out);
-  EXPECT_NE(Joined(out).find("Fatal error: No mesh supplied"), std::string::npos) << Joined(out);
+  EXPECT_FATAL(Open(FileSpec(kDataFile, zrn2), Request(FemDataExpect::kGrid, FemDataLocation::kElements)),
+               "Fatal error: No mesh supplied");
 }
 
 }  // namespace

@@ -1,4 +1,5 @@
-// Limiters: Barth-Jespersen bounds, ENO choice and ties, the weighted limiter.
+// Limiters: Barth-Jespersen extrema, dry neighbours and 3D bounds, ENO choice
+// and ties, the weighted limiter.
 
 #include <gtest/gtest.h>
 
@@ -6,90 +7,18 @@
 #include <cmath>
 #include <random>
 
-#include "grad_meshes.hpp"
 #include "mesh/gradient.hpp"
 #include "mesh/gradient_limiter.hpp"
+#include "mesh_support.hpp"
 
 namespace vhd {
 namespace {
 
-using gradtest::Generated;
-using gradtest::kLayouts;
+using test::Generated;
+using test::kLayouts;
 
 int Across(const Mesh& m, int f, int e) {
   return m.faces.element1[f] == e ? m.faces.element2[f] : m.faces.element1[f];
-}
-
-// Extrapolated face-centre values of e stay within [min, max] of e and its
-// active neighbours (faces towards active neighbours only).
-bool WithinBounds(const Mesh& m, const Array1<double>& phi, const Array1<int>& wet, double gx, double gy, int e,
-                  double tol) {
-  double lo = phi[e], hi = phi[e];
-  for (int j = 1; j <= ElementFaceCount(m.elements, e); ++j) {
-    const int nb = Across(m, ElementFace(m.elements, e, j), e);
-    if (nb > 0 && (wet.empty() || wet[nb] == 1)) {
-      lo = std::min(lo, phi[nb]);
-      hi = std::max(hi, phi[nb]);
-    }
-  }
-  for (int j = 1; j <= ElementFaceCount(m.elements, e); ++j) {
-    const int f = ElementFace(m.elements, e, j);
-    const int nb = Across(m, f, e);
-    if (nb == 0 || (!wet.empty() && wet[nb] != 1)) continue;
-    const double v = phi[e] + gx * (m.faces.xf[f] - m.elements.xc[e]) + gy * (m.faces.yf[f] - m.elements.yc[e]);
-    if (v > hi + tol || v < lo - tol) return false;
-  }
-  return true;
-}
-
-// Random values with least-squares gradients (and random dry elements): no
-// limited face value leaves the bounds, and gradients whose face values
-// already respect the bounds are returned unchanged.
-TEST(BarthJespersen, RandomFieldsStayWithinNeighbourBounds) {
-  for (const auto& layout : kLayouts) {
-    const Mesh m = Generated(layout.layout, 24, 20, 0.2, 9, {{40, 60, 30, 50}});
-    const int ne = m.elements.nelements;
-    GradientStencil s;
-    SetupGradient(m, 2, Array1<int>(), Array1<int>(), 2, kBoundaryMirror, 4, s);
-    std::mt19937 rng(17);
-    std::uniform_real_distribution<double> u(-1, 1);
-    for (int trial = 0; trial < 4; ++trial) {
-      Array1<double> phi(ne), gx(ne), gy(ne), lx(ne), ly(ne);
-      Array1<int> wet(ne, 1);
-      for (int e = 1; e <= ne; ++e) {
-        // Smooth trend plus noise: both limited and unlimited elements occur.
-        phi[e] = 0.05 * m.elements.xc[e] + (trial + 1) * 0.3 * u(rng);
-        if (trial >= 2) wet[e] = u(rng) < -0.8 ? 0 : 1;
-      }
-      CALCGRADIENTELEMENT2D(s, phi, gx, gy);
-      const Array1<int> flags = trial >= 2 ? wet : Array1<int>();
-      CALCLIMITEDGRADIENTBJ2D(m, phi, flags, gx, gy, lx, ly, 1e-14);
-      int unchanged = 0, limited = 0;
-      for (int e = 1; e <= ne; ++e) {
-        if (!flags.empty() && flags[e] != 1) {
-          EXPECT_EQ(lx[e], gx[e]);
-          continue;
-        }
-        ASSERT_TRUE(WithinBounds(m, phi, flags, lx[e], ly[e], e, 1e-12)) << layout.name << " element " << e;
-        if (WithinBounds(m, phi, flags, gx[e], gy[e], e, 0.0)) {
-          ASSERT_EQ(lx[e], gx[e]) << layout.name << " element " << e;
-          ASSERT_EQ(ly[e], gy[e]) << layout.name << " element " << e;
-          ++unchanged;
-        } else {
-          // Scaled, never turned.
-          EXPECT_NEAR(lx[e] * gy[e] - ly[e] * gx[e], 0.0, 1e-12);
-          EXPECT_LE(std::hypot(lx[e], ly[e]), std::hypot(gx[e], gy[e]));
-          ++limited;
-        }
-      }
-      EXPECT_GT(unchanged, 0) << layout.name;
-      EXPECT_GT(limited, 0) << layout.name;
-      // Limiting in place gives the same result.
-      Array1<double> ix = gx, iy = gy;
-      CALCLIMITEDGRADIENTBJ2D(m, phi, flags, ix, iy, ix, iy, 1e-14);
-      for (int e = 1; e <= ne; ++e) ASSERT_EQ(ix[e], lx[e]);
-    }
-  }
 }
 
 TEST(BarthJespersen, ExtremumGivesZeroAndDryNeighboursKeepAlphaOne) {
@@ -222,21 +151,9 @@ TEST(WeightedLimiter, WeightsAndUniformGradients) {
 // The 3D twins on a layered mesh: Barth-Jespersen bounds over all faces of a
 // layered element, ENO ties keep the own gradient.
 TEST(BarthJespersen, LayeredMeshBoundsAndEnoTies) {
-  RectangleMeshSpec spec;
-  spec.x1 = 60;
-  spec.y1 = 40;
-  spec.nx = 6;
-  spec.ny = 5;
-  spec.layout = CellLayout::kMixed;
-  spec.jitter = 0.2;
+  RectangleMeshSpec spec = test::Rectangle(0, 60, 0, 40, 6, 5, CellLayout::kMixed, 0.2);
   spec.bed = [](double x, double) { return -6.0 - 0.1 * x; };
-  Mesh m2, m3;
-  GenerateRectangleMesh(spec, m2);
-  SetupMeshGeometry(m2);
-  VerticalMesh v;
-  v.number_of_layers = 4;
-  CalcVerticalLevels(v, -20.0);
-  BuildLayeredMesh(m2, v, m3);
+  const Mesh m3 = test::Layered(spec, 4, -20.0);
   const int ne = m3.elements.nelements;
   GradientStencil s;
   SetupGradient(m3, 2, Array1<int>(), Array1<int>(), 3, 1, 4, s);
@@ -290,9 +207,9 @@ TEST(LimiterCodes, DispatchAndThreeDimensionalWeightedIsFatal) {
   CALCLIMITEDGRADIENT2D(kLimiterNone, m, phi, Array1<int>(), Array1<int>(), gx, gy, ax, ay, 1e-12);
   for (int e = 1; e <= ne; ++e) ASSERT_EQ(ax[e], 0.5);
   Array1<double> cz(ne);
-  VHD_EXPECT_FATAL(CALCLIMITEDGRADIENT3D(kLimiterWeighted, m, phi, Array1<int>(), Array1<int>(), gx, gy, gz, ax,
-                                         ay, cz, 1e-12),
-                   "Simple limiter not implemented in 3D");
+  EXPECT_FATAL(CALCLIMITEDGRADIENT3D(kLimiterWeighted, m, phi, Array1<int>(), Array1<int>(), gx, gy, gz, ax, ay, cz,
+                                     1e-12),
+               "Simple limiter not implemented in 3D");
 }
 
 }  // namespace

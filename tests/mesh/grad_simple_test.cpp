@@ -5,14 +5,14 @@
 #include <cmath>
 #include <vector>
 
-#include "grad_meshes.hpp"
 #include "mesh/gradient.hpp"
+#include "mesh_support.hpp"
 
 namespace vhd {
 namespace {
 
-using gradtest::Generated;
-using gradtest::kLayouts;
+using test::Generated;
+using test::kLayouts;
 
 bool AllNeighbours(const Mesh& m, int e) {
   for (int j = 1; j <= ElementFaceCount(m.elements, e); ++j) {
@@ -103,29 +103,15 @@ TEST(NodeGradient, VelocityFromElementValuesThroughNodes) {
   EXPECT_GT(checked, ne / 2);
 }
 
-Mesh Layered(CellLayout layout, double jitter, bool sloping, Mesh& m2) {
-  RectangleMeshSpec spec;
-  spec.x1 = 60;
-  spec.y1 = 40;
-  spec.nx = 6;
-  spec.ny = 4;
-  spec.layout = layout;
-  spec.jitter = jitter;
+Mesh Layered(CellLayout layout, double jitter, bool sloping) {
+  RectangleMeshSpec spec = test::Rectangle(0, 60, 0, 40, 6, 4, layout, jitter);
   if (sloping) spec.bed = [](double x, double y) { return -8.0 - 0.05 * x + 0.03 * y; };
   else spec.bed = [](double, double) { return -8.0; };
-  GenerateRectangleMesh(spec, m2);
-  SetupMeshGeometry(m2);
-  VerticalMesh v;
-  v.number_of_layers = 4;
-  CalcVerticalLevels(v, -20.0);
-  Mesh m3;
-  BuildLayeredMesh(m2, v, m3);
-  return m3;
+  return test::Layered(spec, 4, -20.0);
 }
 
 TEST(NodeGradient, LayeredElementsFromNodeValues) {
-  Mesh m2;
-  const Mesh m3 = Layered(CellLayout::kMixed, 0.2, true, m2);
+  const Mesh m3 = Layered(CellLayout::kMixed, 0.2, true);
   const int nn = m3.nodes.nnodes, ne = m3.elements.nelements;
   Array1<double> pn(nn), qn(nn), hn(nn);
   for (int i = 1; i <= nn; ++i) {
@@ -150,8 +136,7 @@ TEST(NodeGradient, LayeredElementsFromNodeValues) {
 // elements with neighbours on every side, and the along-layer velocity
 // gradient on elements with four side neighbours.
 TEST(GreenGauss, LayeredRegularHexahedra) {
-  Mesh m2;
-  const Mesh m3 = Layered(CellLayout::kQuadrilaterals, 0.0, false, m2);
+  const Mesh m3 = Layered(CellLayout::kQuadrilaterals, 0.0, false);
   const int ne = m3.elements.nelements;
   Array1<double> phi(ne), u(ne), v(ne);
   for (int e = 1; e <= ne; ++e) {

@@ -4,18 +4,17 @@
 #include <gtest/gtest.h>
 
 #include <cmath>
-#include <cstdio>
 #include <random>
 #include <vector>
 
-#include "grad_meshes.hpp"
 #include "mesh/gradient.hpp"
+#include "mesh_support.hpp"
 
 namespace vhd {
 namespace {
 
-using gradtest::Generated;
-using gradtest::kLayouts;
+using test::Generated;
+using test::kLayouts;
 
 constexpr double kA = 5.0, kB = 0.3, kC = -0.7;
 
@@ -148,8 +147,6 @@ TEST(GradientStencil, SmoothFieldConvergesAtFirstOrderOrBetter) {
       const double error = std::sqrt(sum / area);
       if (level > 0) {
         const double rate = std::log2(previous / error);
-        std::printf("gradient type %d: L2 error %.3e at %d x %d cells, rate %.2f\n", type, error, n, (n * 4) / 5,
-                    rate);
         EXPECT_GT(rate, 0.9) << "type " << type << " level " << level;
       }
       previous = error;
@@ -160,27 +157,15 @@ TEST(GradientStencil, SmoothFieldConvergesAtFirstOrderOrBetter) {
 TEST(GradientStencil, UnknownTypeIsFatal) {
   const Mesh m = Generated(CellLayout::kRightTriangles, 2, 2, 0.0);
   GradientStencil s;
-  VHD_EXPECT_FATAL(SetupGradient(m, 4, Array1<int>(), Array1<int>(), 2, 1, 4, s),
-                   "SetupGradient: Gradient type not supported");
+  EXPECT_FATAL(SetupGradient(m, 4, Array1<int>(), Array1<int>(), 2, 1, 4, s),
+               "SetupGradient: Gradient type not supported");
 }
 
 // The 3D least-squares stencil on a layered mesh over a sloping bed.
 TEST(GradientStencil, LinearFieldExactOnLayeredMesh) {
-  RectangleMeshSpec spec;
-  spec.x1 = 100;
-  spec.y1 = 80;
-  spec.nx = 8;
-  spec.ny = 6;
-  spec.layout = CellLayout::kMixed;
-  spec.jitter = 0.15;
+  RectangleMeshSpec spec = test::Rectangle(0, 100, 0, 80, 8, 6, CellLayout::kMixed, 0.15);
   spec.bed = [](double x, double y) { return -10.0 - 0.05 * x - 0.02 * y; };
-  Mesh m2, m3;
-  GenerateRectangleMesh(spec, m2);
-  SetupMeshGeometry(m2);
-  VerticalMesh v;
-  v.number_of_layers = 4;
-  CalcVerticalLevels(v, -20.0);
-  BuildLayeredMesh(m2, v, m3);
+  const Mesh m3 = test::Layered(spec, 4, -20.0);
   const int ne = m3.elements.nelements;
   Array1<double> phi(ne);
   for (int e = 1; e <= ne; ++e)

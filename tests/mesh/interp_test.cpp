@@ -4,17 +4,16 @@
 
 #include <algorithm>
 #include <cmath>
-#include <limits>
 #include <random>
 
-#include "grad_meshes.hpp"
 #include "mesh/interpolation.hpp"
+#include "mesh_support.hpp"
 
 namespace vhd {
 namespace {
 
-using gradtest::Generated;
-using gradtest::kLayouts;
+using test::Generated;
+using test::kLayouts;
 
 constexpr double kDelete = -1e-35;
 
@@ -170,28 +169,17 @@ TEST(PointValue, OtherElementTypesAreFatal) {
   const int line[2] = {1, 2};
   AddElement(m.elements, 1, 11, 2, line);
   Array1<double> pn(2, 1.0);
-  VHD_EXPECT_FATAL(CalcPointValue2D(m, 0.5, 0, 1, pn, kDelete, kModeScalar),
-                   "CalcPointValue2D: Interpolation not possible for this typ");
+  EXPECT_FATAL(CalcPointValue2D(m, 0.5, 0, 1, pn, kDelete, kModeScalar),
+               "CalcPointValue2D: Interpolation not possible for this typ");
 }
 
 // Layered mesh: node values from the layers around a node, point values
 // inside prisms and hexahedra, for a field linear in x, y and z.
 TEST(PseudoLaplacian, LayeredMeshNodeAndPointValues) {
-  RectangleMeshSpec spec;
-  spec.x1 = 60;
-  spec.y1 = 40;
-  spec.nx = 6;
-  spec.ny = 4;
-  spec.layout = CellLayout::kMixed;
-  spec.jitter = 0.1;
+  RectangleMeshSpec spec = test::Rectangle(0, 60, 0, 40, 6, 4, CellLayout::kMixed, 0.1);
   spec.bed = [](double x, double) { return -6.0 - 0.05 * x; };
-  Mesh m2, m3;
-  GenerateRectangleMesh(spec, m2);
-  SetupMeshGeometry(m2);
-  VerticalMesh vm;
-  vm.number_of_layers = 3;
-  CalcVerticalLevels(vm, -20.0);
-  BuildLayeredMesh(m2, vm, m3);
+  Mesh m2;
+  const Mesh m3 = test::Layered(spec, 3, -20.0, m2);
   const int ne = m3.elements.nelements, nn = m3.nodes.nnodes;
   auto field = [](double x, double y, double z) { return 1.0 + 0.1 * x + 0.2 * y + 0.3 * z; };
   Array1<double> phi(ne), pn(nn), wn(nn);

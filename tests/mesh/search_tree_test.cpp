@@ -7,14 +7,14 @@
 #include <random>
 #include <vector>
 
-#include "grad_meshes.hpp"
 #include "mesh/search_tree.hpp"
+#include "mesh_support.hpp"
 
 namespace vhd {
 namespace {
 
-using gradtest::Generated;
-using gradtest::kLayouts;
+using test::Generated;
+using test::kLayouts;
 
 // Brute force: element bounding boxes binned on a uniform grid; every element
 // whose box holds the point is tested.
@@ -178,25 +178,14 @@ TEST(SearchTree, OverlappingElementsAreFatal) {
   for (int e = 1; e <= 25; ++e) AddElement(m.elements, e, 21, 3, tri);
   SetupShapeData(m);
   SearchTree2D tree;
-  VHD_EXPECT_FATAL(BuildSearchTree2D(m, tree), "InsertElementd2DSearchTree: Error building search tree");
+  EXPECT_FATAL(BuildSearchTree2D(m, tree), "InsertElementd2DSearchTree: Error building search tree");
 }
 
 TEST(SearchTree, LayeredMeshSearchesItsColumns) {
-  RectangleMeshSpec spec;
-  spec.x1 = 50;
-  spec.y1 = 40;
-  spec.nx = 10;
-  spec.ny = 8;
-  spec.layout = CellLayout::kMixed;
-  spec.jitter = 0.2;
+  RectangleMeshSpec spec = test::Rectangle(0, 50, 0, 40, 10, 8, CellLayout::kMixed, 0.2);
   spec.bed = [](double, double) { return -5.0; };
-  Mesh m2, m3;
-  GenerateRectangleMesh(spec, m2);
-  SetupMeshGeometry(m2);
-  VerticalMesh v;
-  v.number_of_layers = 3;
-  CalcVerticalLevels(v, -5.0);
-  BuildLayeredMesh(m2, v, m3);
+  Mesh m2;
+  const Mesh m3 = test::Layered(spec, 3, -5.0, m2);
   SearchTree2D tree;
   BuildSearchTree2D(m3, tree);
   for (int c = 1; c <= m2.elements.nelements; ++c)
@@ -204,7 +193,7 @@ TEST(SearchTree, LayeredMeshSearchesItsColumns) {
 
   Mesh flat = m3;
   flat.nlayers = 0;
-  VHD_EXPECT_FATAL(BuildSearchTree2D(flat, tree), "BuildSearchTree2D: Mesh must be 2D or 3D layered");
+  EXPECT_FATAL(BuildSearchTree2D(flat, tree), "BuildSearchTree2D: Mesh must be 2D or 3D layered");
 }
 
 }  // namespace

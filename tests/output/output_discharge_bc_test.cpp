@@ -34,33 +34,16 @@ PointRecords ReadPointFile(const std::string& path) {
   zrnFileRead(f, path, &status);
   EXPECT_EQ(status, 0) << path;
   if (status != 0) return r;
-  int nitems = 0;
-  zrnGetNoOfItems(f, nitems);
-  std::vector<std::string> names(static_cast<std::size_t>(nitems) + 1);
-  for (int i = 1; i <= nitems; ++i) {
-    int item_type = 0, unit = 0, value_type = 0;
-    zrnGetItemInfo(f, i, names[i], item_type, unit, value_type);
-    ZrnSpatialAxis axis;
-    zrnGetItemDim(f, i, axis);
-    EXPECT_EQ(axis.type, kZrnAxisD0) << names[i];
-  }
-  ZrnDateTime start;
-  double span = 0.0;
-  int nsteps = 0;
-  zrnGetNeqCalendarAxis(f, start, span, nsteps, &status);
-  EXPECT_EQ(status, 0) << path;
-  for (int step = 0; step < nsteps; ++step) {
-    for (int k = 1; k <= nitems; ++k) {
-      int item = 0;
-      double t = 0.0, v = 0.0;
-      zrnReadItemTimeStep(f, item, t, &v, 1, &status);
-      EXPECT_EQ(status, 0) << path << " step " << step;
-      EXPECT_EQ(item, k);
-      if (k == 1) r.time.push_back(t);
-      r.items[names[k]].push_back(v);
+  r.time = f.step_times;
+  for (int step = 0; step < f.time.nsteps; ++step)
+    for (int k = 1; k <= static_cast<int>(f.items.size()); ++k) {
+      const ZrnItemInfo& item = f.items[static_cast<std::size_t>(k - 1)];
+      EXPECT_EQ(item.axis.type, kZrnAxisD0) << item.name;
+      double v = 0.0;
+      EXPECT_EQ(ZrnReadItemAtStep(f, step, k, &v, 1), 0) << path << " step " << step;
+      r.items[item.name].push_back(v);
     }
-  }
-  zrnFileClose(f, &status);
+  zrnFileClose(f);
   return r;
 }
 

@@ -34,20 +34,26 @@ public:
     CloseLogFile();
   }
 
-  // nx x ny cells of dx x dy from (x0, y0), bed level z(x, y).
+  // nx x ny cells of dx x dy from the origin, bed level z(x, y).
   void MakeMesh(int nx, int ny, double dx, double dy, Field bed = {},
-                CellLayout layout = CellLayout::kQuadrilaterals, double x0 = 0.0, double y0 = 0.0) {
+                CellLayout layout = CellLayout::kQuadrilaterals) {
     RectangleMeshSpec spec;
-    spec.x0 = x0;
-    spec.x1 = x0 + nx * dx;
-    spec.y0 = y0;
-    spec.y1 = y0 + ny * dy;
+    spec.x1 = nx * dx;
+    spec.y1 = ny * dy;
     spec.nx = nx;
     spec.ny = ny;
     spec.layout = layout;
     spec.bed = std::move(bed);
     GenerateRectangleMesh(spec, mesh);
     SetupMeshGeometry(mesh);
+  }
+
+  // Drying and flooding switched on.
+  void FloodDry() {
+    hd.flood_dry.type = 1;
+    hd.flood_dry.drying_depth = 0.005;
+    hd.flood_dry.flooding_depth = 0.05;
+    hd.flood_dry.mass_depth = 0.1;
   }
 
   // Writes the setup file (the HYDRODYNAMIC_MODULE table and the body), opens
