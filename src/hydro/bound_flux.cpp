@@ -100,14 +100,14 @@ void WriteFace(HdState& st, HdSolver& s, int f, RiemannFlux F, bool wet, double 
   st.face_flux[f] = F.Fh;
   st.face_flux_len[f] = F.mass;
   if (wet) {
-    SetBoundaryFaceTerms(s, f, F.mass, -F.momx + bedslope * nx, -F.momy + bedslope * ny);
+    SetBoundaryFaceTerms(s, f, -F.momx + bedslope * nx, -F.momy + bedslope * ny);
   } else {
-    SetBoundaryFaceTerms(s, f, F.mass, 0.0, 0.0);
+    SetBoundaryFaceTerms(s, f, 0.0, 0.0);
   }
 }
 
 void ZeroFace(HdState& st, HdSolver& s, int f) {
-  SetBoundaryFaceTerms(s, f, 0.0, 0.0, 0.0);
+  SetBoundaryFaceTerms(s, f, 0.0, 0.0);
   st.face_flux[f] = st.face_flux_len[f] = 0.0;
 }
 

@@ -152,7 +152,7 @@ void LandFaceTerms(const FaceLoopInput& in, HdSolver& s, const BoundaryFaceRecor
   }
   double mx, my;
   WallTerms(in, e, side, rec.ex, rec.ey, rec.nn, rec.nn * in.face_length[f], mx, my);
-  SetBoundaryFaceTerms(s, f, 0.0, mx, my);
+  SetBoundaryFaceTerms(s, f, mx, my);
 }
 
 // Velocity (m/s) with which water leaving element e carries momentum: its
@@ -187,7 +187,7 @@ inline void ScaleFlux(RiemannFlux& F, double theta) {
   F.momy *= theta;
 }
 
-void ZeroFace(HdSolver& s, int f) { SetFaceTerms(s, f, 0.0, 0.0, 0.0, 0.0, 0.0); }
+void ZeroFace(HdSolver& s, int f) { SetFaceTerms(s, f, 0.0, 0.0, 0.0, 0.0); }
 
 // Face values of the two sides of interior face f (l, r hold the centre
 // values on entry): with second order the reconstructed values, clipped and
@@ -340,7 +340,7 @@ void InteriorFaceTerms(const FaceLoopInput& in, HdSolver& s, double* face_flux, 
       mx2 = F.mass * u;
       my2 = F.mass * v;
     }
-    SetFaceTerms(s, f, F.mass, mx1, my1, mx2, my2);
+    SetFaceTerms(s, f, mx1, my1, mx2, my2);
     return;
   }
 
@@ -349,10 +349,10 @@ void InteriorFaceTerms(const FaceLoopInput& in, HdSolver& s, double* face_flux, 
   double mx, my;
   if (cL == kWet) {
     WallTerms(in, L, l, ex, ey, nn, nlen, mx, my);
-    SetFaceTerms(s, f, 0.0, mx, my, 0.0, 0.0);
+    SetFaceTerms(s, f, mx, my, 0.0, 0.0);
   } else {
     WallTerms(in, R, r, -ex, -ey, nn, nlen, mx, my);
-    SetFaceTerms(s, f, 0.0, 0.0, 0.0, mx, my);
+    SetFaceTerms(s, f, 0.0, 0.0, mx, my);
   }
 }
 
@@ -525,7 +525,7 @@ void InteriorFaceChunk(const FaceLoopInput& in, HdSolver& s, double* face_flux, 
   WetFaceFluxes<kSecond>(in, b, first_index, last_index);
   for (int i = 0; i < b.n; ++i) {
     const int f = b.face[i];
-    SetFaceTerms(s, f, b.mass[i], b.mx1[i], b.my1[i], b.mx2[i], b.my2[i]);
+    SetFaceTerms(s, f, b.mx1[i], b.my1[i], b.mx2[i], b.my2[i]);
     face_flux[f] = b.Fh[i];
     face_flux_len[f] = b.mass[i];
   }
@@ -618,22 +618,29 @@ void FaceTerms(HdModule& hd, HdSolver& s, const Mesh& mesh, const FaceLoopInput&
     if (st.wetdry[rec.element] == kWet) {
       LandFaceTerms(in, s, rec);
     } else {
-      SetBoundaryFaceTerms(s, rec.face, 0.0, 0.0, 0.0);
+      SetBoundaryFaceTerms(s, rec.face, 0.0, 0.0);
     }
   }
 }
 
-// Sums of the face terms of element e in its local face order (slots of the
-// planes, kPlanes of them; a slot beyond the element's faces adds zero).
+// Sums of the face terms of element e in its local face order (its slots of
+// the planes, kPlanes of them; a slot beyond the element's faces adds zero):
+// the water leaving it (sh, with the sign of the side), the momentum terms,
+// and the outflow (the leaving water of the faces that carry it out). mass
+// is HdState::face_flux_len.
 template <int kPlanes>
-[[gnu::always_inline]] inline void ElementSums(const HdSolver& s, int e, double& sh, double& sP, double& sQ) {
-  const double *out = s.side_out.data(), *mx = s.side_mx.data(), *my = s.side_my.data();
-  sh = sP = sQ = 0.0;
+[[gnu::always_inline]] inline void ElementSums(const HdSolver& s, const double* mass, int e, double& sh, double& sP,
+                                               double& sQ, double& out) {
+  const int* slots = s.slot_face_side.data();
+  const double* mom = s.face_momentum.data();
+  sh = sP = sQ = out = 0.0;
   for (int j = 0; j < kPlanes; ++j) {
-    const int k = j * s.plane_stride + e;
-    sh -= out[k];
-    sP += mx[k];
-    sQ += my[k];
+    const int m = slots[j * s.plane_stride + e];
+    const double leaving = (m & 1) ? -mass[m >> 1] : mass[m >> 1];
+    sh -= leaving;
+    out += std::max(0.0, leaving);
+    sP += mom[2 * m];
+    sQ += mom[2 * m + 1];
   }
 }
 
@@ -648,36 +655,43 @@ void ForFacePlanes(const HdSolver& s, Fn&& fn) {
   }
 }
 
-// Outflow limiter of a stage. The stage advances h from the base depth h_b
-// of the step with the fluxes of the stage state, so with a second-order
-// reconstruction or two stages (or a step at dt_min) an element can be sent
-// out more water than it holds. An element with outflow O (m3/s, the sum of
-// its outgoing face mass fluxes) and held volume V = A max(0, h_b + dt s_h)
-// below dt O gets the factor theta = V / (dt O); every face multiplies its
-// flux (mass and momentum, not the bed slope and not the eddy stress) by the
-// factor of its upwind element. Both sides of a face see the same flux, so
-// mass and momentum stay conserved; incoming fluxes are not counted, so the
-// new depth is never negative. Water at rest has no mass flux and is never
-// touched.
+// Element sums of the face terms into sum_h, sum_P, sum_Q of the solver
+// (gathered from the faces in the local face order of each element, so the
+// element update reads them in vector lanes), and the outflow limiter of a
+// stage when dt > 0.
+//
+// Outflow limiter: the stage advances h from the base depth h_b of the step
+// with the fluxes of the stage state, so with a second-order reconstruction
+// or two stages (or a step at dt_min) an element can be sent out more water
+// than it holds. An element with outflow O (m3/s, the sum of its outgoing
+// face mass fluxes) and held volume V = A max(0, h_b + dt s_h) below dt O
+// gets the factor theta = V / (dt O); every face multiplies its flux (mass
+// and momentum, not the bed slope and not the eddy stress) by the factor of
+// its upwind element. Both sides of a face see the same flux, so mass and
+// momentum stay conserved; incoming fluxes are not counted, so the new depth
+// is never negative. Water at rest has no mass flux and is never touched.
 // Returns the number of limited elements.
-int OutflowFactorsHD(HdModule& hd, HdSolver& s, const Mesh& mesh, int ne, bool first_stage, double dt) {
+int ElementSumsHD(HdModule& hd, HdSolver& s, const Mesh& mesh, int ne, bool first_stage, double dt) {
   const HdState& st = hd.state;
-  const double* out_terms = s.side_out.data();
-  const int stride = s.plane_stride;
+  const double* mass = st.face_flux_len.data();
   const double* area = mesh.elements.area.data();
   const double* hbase = first_stage ? st.h.data() : st.h_old.data();
   const double* src_h = s.src_h.data();
+  double *sum_h = s.sum_h.data(), *sum_P = s.sum_P.data(), *sum_Q = s.sum_Q.data();
   double* factor = s.outflow_factor.data();
   int nlimited = 0;
   ForFacePlanes(s, [&](auto planes) {
-    VHD_OMP_PARALLEL_FOR_SIMD_REDUCTION(+, nlimited)
+    VHD_OMP_PARALLEL_FOR_REDUCTION(+, nlimited)
     for (int e = 1; e <= ne; ++e) {
-      double out = 0.0;
-      for (int j = 0; j < planes; ++j) out += std::max(0.0, out_terms[j * stride + e]);
-      const double held = std::max(0.0, hbase[e] + dt * src_h[e]) * area[e];
-      const bool limited = dt * out > held;
-      factor[e] = limited ? held / (dt * out) : 1.0;
-      nlimited += limited ? 1 : 0;
+      double sh, sP, sQ, out;
+      ElementSums<planes>(s, mass, e, sh, sP, sQ, out);
+      sum_h[e] = sh, sum_P[e] = sP, sum_Q[e] = sQ;
+      if (dt > 0) {
+        const double held = std::max(0.0, hbase[e] + dt * src_h[e]) * area[e];
+        const bool limited = dt * out > held;
+        factor[e] = limited ? held / (dt * out) : 1.0;
+        nlimited += limited ? 1 : 0;
+      }
     }
   });
   return nlimited;
@@ -724,7 +738,7 @@ void LimitOutflowHD(HdModule& hd, HdSolver& s, const Mesh& mesh, const FaceLoopI
 // base state is the current one (kept in h_old, P_old, Q_old unless kLast);
 // else it is h_old, P_old, Q_old. The depth is cut at 0 after every stage but
 // the last. kIterate: the drag is formed a second time (discretisation 2).
-template <int kPlanes, bool kFirst, bool kLast, bool kIterate>
+template <bool kFirst, bool kLast, bool kIterate>
 void UpdateElementsHD(HdModule& hd, const HdSolver& s, const Mesh& mesh, int ne, double dt) {
   HdState& st = hd.state;
   const double* area = mesh.elements.area.data();
@@ -733,6 +747,7 @@ void UpdateElementsHD(HdModule& hd, const HdSolver& s, const Mesh& mesh, int ne,
   const double* cf_bed = st.cf.data();
   const double* cf_surface = st.cf_surface.data();
   const double *src_h = s.src_h.data(), *src_P = s.src_P.data(), *src_Q = s.src_Q.data();
+  const double *sum_h = s.sum_h.data(), *sum_P = s.sum_P.data(), *sum_Q = s.sum_Q.data();
   double *h = st.h.data(), *eta = st.eta.data(), *P = st.P.data(), *Q = st.Q.data();
   double *h_old = st.h_old.data(), *P_old = st.P_old.data(), *Q_old = st.Q_old.data();
   const double h_min = hd.flood_dry.mass_depth;
@@ -742,10 +757,8 @@ void UpdateElementsHD(HdModule& hd, const HdSolver& s, const Mesh& mesh, int ne,
   constexpr double half_pi = 0.5 * std::numbers::pi;
   VHD_OMP_PARALLEL_FOR_SIMD
   for (int e = 1; e <= ne; ++e) {
-    double sh, sP, sQ;
-    ElementSums<kPlanes>(s, e, sh, sP, sQ);
     const double inv = 1.0 / area[e];
-    const double dhdt = sh * inv, dPdt = sP * inv, dQdt = sQ * inv;
+    const double dhdt = sum_h[e] * inv, dPdt = sum_P[e] * inv, dQdt = sum_Q[e] * inv;
     const double Pe = P[e], Qe = Q[e];  // state of the stage
     double hb, Pb, Qb;                  // base state of the step
     if constexpr (kFirst) {
@@ -849,13 +862,12 @@ void SetupSolverHD(HdModule& hd, const Mesh& mesh, HdSolver& s) {
   }
   s.face_planes = planes < 4 ? 3 : 4;
   s.plane_stride = ne;
-  for (Array1<double>* a : {&s.side_out, &s.side_mx, &s.side_my}) a->assign(s.face_planes * ne, 0.0);
-  s.face_slot1.assign(nf, 0);
-  s.face_slot2.assign(nf, 0);
+  s.face_momentum.assign(4 * nf + 3, 0.0);
+  s.slot_face_side.assign(s.face_planes * ne, 0);
   for (int e = 1; e <= ne; ++e) {
     for (int j = 1; j <= ElementFaceCount(E, e); ++j) {
       const int f = ElementFace(E, e, j);
-      (F.element1[f] == e ? s.face_slot1 : s.face_slot2)[f] = (j - 1) * ne + e;
+      s.slot_face_side[(j - 1) * ne + e] = 2 * f + (F.element1[f] == e ? 0 : 1);
     }
   }
 
@@ -890,6 +902,7 @@ void SetupSolverHD(HdModule& hd, const Mesh& mesh, HdSolver& s) {
 
   for (Array1<double>* a : {&s.src_h, &s.src_P, &s.src_Q, &s.depth_correction}) a->assign(ne, 0.0);
   s.outflow_factor.assign(ne, 1.0);
+  for (Array1<double>* a : {&s.sum_h, &s.sum_P, &s.sum_Q}) a->assign(ne, 0.0);
   if (second) {
     for (Array1<double>* a : {&s.eta_x, &s.eta_y, &s.P_x, &s.P_y, &s.Q_x, &s.Q_y}) a->assign(ne, 0.0);
   }
@@ -919,17 +932,14 @@ void CalcDerivativesOnlySW2D(HdModule& hd, HdSolver& s, const Mesh& mesh, Array1
   }
   VHD_OMP_PARALLEL { FaceTerms(hd, s, mesh, in); }
   if (!sums) return;
-  ForFacePlanes(s, [&](auto planes) {
-    VHD_OMP_PARALLEL_FOR
-    for (int e = 1; e <= ne; ++e) {
-      double sh, sP, sQ;
-      ElementSums<planes>(s, e, sh, sP, sQ);
-      const double inv = 1.0 / area[e];
-      (*dhdt)[e] = sh * inv;
-      (*dPdt)[e] = sP * inv;
-      (*dQdt)[e] = sQ * inv;
-    }
-  });
+  ElementSumsHD(hd, s, mesh, ne, true, 0.0);
+  VHD_OMP_PARALLEL_FOR
+  for (int e = 1; e <= ne; ++e) {
+    const double inv = 1.0 / area[e];
+    (*dhdt)[e] = s.sum_h[e] * inv;
+    (*dPdt)[e] = s.sum_P[e] * inv;
+    (*dQdt)[e] = s.sum_Q[e] * inv;
+  }
 }
 
 void CALCDERIVATIVESW2D(HdModule& hd, HdSolver& s, const Mesh& mesh, int stage, double dt,
@@ -943,24 +953,24 @@ void CALCDERIVATIVESW2D(HdModule& hd, HdSolver& s, const Mesh& mesh, int stage, 
       mesh.elements.nelements_int > 0 ? mesh.elements.nelements_int : mesh.elements.nelements;
   const bool first_stage = stage == 1;
   VHD_OMP_PARALLEL { FaceTerms(hd, s, mesh, in); }
-  if (OutflowFactorsHD(hd, s, mesh, ne, first_stage, dt) > 0) LimitOutflowHD(hd, s, mesh, in);
-  const bool iterate = hd.solution.bed_resistance_discretization == 2;
-  ForFacePlanes(s, [&](auto planes) {
-    auto update = [&](auto first, auto last) {
-      if (iterate) {
-        UpdateElementsHD<planes, first, last, true>(hd, s, mesh, ne, dt);
-      } else {
-        UpdateElementsHD<planes, first, last, false>(hd, s, mesh, ne, dt);
-      }
-    };
-    if (!first_stage) {
-      update(std::false_type{}, std::false_type{});
-    } else if (last_stage) {
-      update(std::true_type{}, std::true_type{});
+  if (ElementSumsHD(hd, s, mesh, ne, first_stage, dt) > 0) {
+    LimitOutflowHD(hd, s, mesh, in);
+    ElementSumsHD(hd, s, mesh, ne, first_stage, 0.0);
+  }
+  auto update = [&](auto first, auto last) {
+    if (hd.solution.bed_resistance_discretization == 2) {
+      UpdateElementsHD<first, last, true>(hd, s, mesh, ne, dt);
     } else {
-      update(std::true_type{}, std::false_type{});
+      UpdateElementsHD<first, last, false>(hd, s, mesh, ne, dt);
     }
-  });
+  };
+  if (!first_stage) {
+    update(std::false_type{}, std::false_type{});
+  } else if (last_stage) {
+    update(std::true_type{}, std::true_type{});
+  } else {
+    update(std::true_type{}, std::false_type{});
+  }
 }
 
 void CALCVELOCITYFILTER2D(HdModule& hd, HdSolver& s, const Mesh& mesh) {

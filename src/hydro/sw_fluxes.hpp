@@ -97,11 +97,11 @@ struct HdSolver {
   Array1<int> interior_faces;
   Array1<BoundaryFaceRecord> boundary_faces;
 
-  // Face slot planes: every element has face_planes slots (the largest face
-  // count of the mesh's elements: 3 for triangles, 4 with quadrilaterals);
-  // the slot of local face j (0-based) of element e is j * plane_stride + e.
-  // A slot beyond an element's own faces stays zero. Plane by plane, the
-  // element passes read their slots one after the other in vector lanes.
+  // Face planes: every element has face_planes slots (the largest face count
+  // of the mesh's elements: 3 for triangles, 4 with quadrilaterals); the slot
+  // of local face j (0-based) of element e is j * plane_stride + e. Plane by
+  // plane, the element passes read their slots one after the other in vector
+  // lanes.
   int face_planes = 0;
   int plane_stride = 0;
 
@@ -112,13 +112,18 @@ struct HdSolver {
   // term is HdState::face_d, set here at setup.)
   Array1<double> interior_ex, interior_ey, interior_nn, interior_len;
 
-  // Face terms of the current stage, one slot per element and local face
-  // (planes above): the water leaving the element through the face (m3/s,
-  // negative when it enters) and the momentum terms of that side (m4/s2).
-  // face_slot1/2 give the slots of the face's element1 and element2 sides (0
-  // for a boundary face's outer side).
-  Array1<double> side_out, side_mx, side_my;
-  Array1<int> face_slot1, face_slot2;
+  // Momentum terms of the current stage, four per face f at 4f .. 4f + 3:
+  // x and y of the element1 side, then of the element2 side (m4/s2; zero on
+  // the outer side of a boundary face). The face loop writes them in face
+  // order; the mass flux of the face is HdState::face_flux_len.
+  Array1<double> face_momentum;
+  // Per slot (planes above): 2f + s for face f of the slot, s = 0 where the
+  // element is the face's element1 and 1 where it is element2, so that the
+  // slot's momentum terms are face_momentum[2 (2f + s)] and the next, and the
+  // water leaving the element is face_flux_len[f] with the sign of the side.
+  // A slot beyond an element's own faces holds 0: face 0, whose mass flux and
+  // momentum terms (the spare entries) stay zero.
+  Array1<int> slot_face_side;
 
   // Gradient stencil (second order or eddy viscosity), built once at setup,
   // and the unlimited gradients read by the ENO and weighted limiters.
@@ -134,6 +139,9 @@ struct HdSolver {
   // Per element: the factor (0..1] of its outgoing mass fluxes in the
   // current stage (outflow limiter, see CALCDERIVATIVESW2D).
   Array1<double> outflow_factor;
+  // Per element: the sums of the face terms of the stage (the water entering
+  // it, m3/s, and its momentum terms, m4/s2).
+  Array1<double> sum_h, sum_P, sum_Q;
   // Element depth correction k (m), zero in ordinary runs.
   Array1<double> depth_correction;
   // Weight of the velocity filter (element area, m2), and scratch for it
@@ -210,18 +218,17 @@ inline bool RiemannFaceCase(int cL, int cR, double etaL, double dL, double etaR,
   return x * sum;
 }
 
-// Terms of face f for both sides: mass flux (m3/s, positive from element1 to
-// element2) and the momentum terms of each side.
-inline void SetFaceTerms(HdSolver& s, int f, double mass, double mx1, double my1, double mx2, double my2) {
-  const int a = s.face_slot1[f], b = s.face_slot2[f];
-  s.side_out[a] = mass, s.side_mx[a] = mx1, s.side_my[a] = my1;
-  s.side_out[b] = -mass, s.side_mx[b] = mx2, s.side_my[b] = my2;
+// Momentum terms of face f for both sides (its mass flux goes into
+// HdState::face_flux_len).
+inline void SetFaceTerms(HdSolver& s, int f, double mx1, double my1, double mx2, double my2) {
+  double* m = s.face_momentum.data() + 4 * f;
+  m[0] = mx1, m[1] = my1, m[2] = mx2, m[3] = my2;
 }
 
-// Terms of boundary face f for its inner side (element1).
-inline void SetBoundaryFaceTerms(HdSolver& s, int f, double mass, double mx, double my) {
-  const int a = s.face_slot1[f];
-  s.side_out[a] = mass, s.side_mx[a] = mx, s.side_my[a] = my;
+// Momentum terms of boundary face f for its inner side (element1).
+inline void SetBoundaryFaceTerms(HdSolver& s, int f, double mx, double my) {
+  double* m = s.face_momentum.data() + 4 * f;
+  m[0] = mx, m[1] = my;
 }
 
 // Terms of a boundary face closed as land (the record's face and inner
