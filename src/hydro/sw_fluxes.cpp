@@ -42,7 +42,7 @@ struct FaceLoopInput {
   bool preserve_dU, face_limit_dry;
 };
 
-double Clip(double value, double a, double b) {
+inline double Clip(double value, double a, double b) {
   return std::min(std::max(value, std::min(a, b)), std::max(a, b));
 }
 
@@ -189,6 +189,10 @@ inline void ScaleFlux(RiemannFlux& F, double theta) {
 
 void ZeroFace(HdSolver& s, int f) { SetFaceTerms(s, f, 0.0, 0.0, 0.0, 0.0); }
 
+// Depth below which a side makes a second-order face fall back to first
+// order (with face_limit_dry), from the centre depths of its sides.
+inline double FallBackDepth(const FaceLoopInput& in, double hL, double hR) { return 0.05 * (in.h_min + hL + hR); }
+
 // Face values of the two sides of interior face f (l, r hold the centre
 // values on entry): with second order the reconstructed values, clipped and
 // sign-kept as the settings ask; then the face d and face depth of each side.
@@ -200,7 +204,7 @@ template <bool kSecond>
   const double hL = l.h, hR = r.h;
   bool first = !kSecond;
   if constexpr (kSecond) {
-    const double limit = 0.05 * (in.h_min + hL + hR);
+    const double limit = FallBackDepth(in, hL, hR);
     first = in.face_limit_dry && (limit > hL || limit > hR);
     if (first && in.fad != 0 && (limit > hL) != (limit > hR)) VelocityAtFaceDepth(limit > hL ? r : l, in.face_d[f]);
     if (!first) {
@@ -407,41 +411,47 @@ struct WetFaceBatch {
   // The face geometry, gathered only when the batch holds part of its chunk
   // (a batch of the whole chunk reads the solver's arrays in place).
   double ex[kFaceBatch], ey[kFaceBatch], nn[kFaceBatch], len[kFaceBatch];
-  // Second order: the velocity bound of the face (infinite where the face fell
-  // back to first order) from the centre velocities of its sides.
+  // Second order: the velocity bound of the face from the centre velocities
+  // of its sides.
   double umax[kFaceBatch], vmax[kFaceBatch];
   // Results: flux per unit length and times the length, momentum of each side.
   double Fh[kFaceBatch], mass[kFaceBatch];
   double mx1[kFaceBatch], my1[kFaceBatch], mx2[kFaceBatch], my2[kFaceBatch];
 };
 
-// Adds a plain wet face to the batch.
-template <bool kSecond>
-inline void AddWetFace(const FaceLoopInput& in, WetFaceBatch& b, int f, int position, int L, int R,
-                       const SideValues& l, const SideValues& r, bool first) {
+// Eddy flux of entry i of the batch, interior face at position p between L and R.
+inline void BatchEddyFlux(const FaceLoopInput& in, WetFaceBatch& b, int i, int p, int L, int R) {
+  EddyFlux(0.5 * (in.nu[L] + in.nu[R]), 0.5 * (in.h[L] + in.h[R]), 0.5 * (in.ux[L] + in.ux[R]),
+           0.5 * (in.uy[L] + in.uy[R]), 0.5 * (in.vx[L] + in.vx[R]), 0.5 * (in.vy[L] + in.vy[R]), in.ex[p], in.ey[p],
+           in.nn[p] * in.len[p], b.Dx[i], b.Dy[i]);
+}
+
+// Adds face f (position in interior_faces) between L and R to the batch:
+// returns its entry, whose face values the caller sets.
+inline int AddBatchFace(const FaceLoopInput& in, WetFaceBatch& b, int f, int position, int L, int R) {
   const int i = b.n++;
   b.face[i] = f;
   b.position[i] = position;
+  b.kl[i] = in.k[L], b.kr[i] = in.k[R], b.etal[i] = in.eta[L], b.etar[i] = in.eta[R];
+  if (in.eddy) BatchEddyFlux(in, b, i, position, L, R);
+  return i;
+}
+
+// Adds a plain wet face of a first-order run with its face values.
+inline void AddWetFace(const FaceLoopInput& in, WetFaceBatch& b, int f, int position, int L, int R,
+                       const SideValues& l, const SideValues& r) {
+  const int i = AddBatchFace(in, b, f, position, L, R);
   b.hl[i] = l.h, b.hr[i] = r.h, b.dl[i] = l.d, b.dr[i] = r.d;
   b.Pl[i] = l.P, b.Pr[i] = r.P, b.Ql[i] = l.Q, b.Qr[i] = r.Q;
-  b.kl[i] = in.k[L], b.kr[i] = in.k[R], b.etal[i] = in.eta[L], b.etar[i] = in.eta[R];
-  if (in.eddy) {
-    const int p = position;
-    EddyFlux(0.5 * (in.nu[L] + in.nu[R]), 0.5 * (in.h[L] + in.h[R]), 0.5 * (in.ux[L] + in.ux[R]),
-             0.5 * (in.uy[L] + in.uy[R]), 0.5 * (in.vx[L] + in.vx[R]), 0.5 * (in.vy[L] + in.vy[R]), in.ex[p],
-             in.ey[p], in.nn[p] * in.len[p], b.Dx[i], b.Dy[i]);
-  }
-  if constexpr (kSecond) {
-    double uL, vL, uR, vR;
-    if (first) {
-      b.umax[i] = b.vmax[i] = std::numeric_limits<double>::infinity();
-    } else {
-      CarriedVelocity(in.code, in.h, in.P, in.Q, in.h_move, L, uL, vL);
-      CarriedVelocity(in.code, in.h, in.P, in.Q, in.h_move, R, uR, vR);
-      b.umax[i] = std::max(std::abs(uL), std::abs(uR));
-      b.vmax[i] = std::max(std::abs(vL), std::abs(vR));
-    }
-  }
+}
+
+// Moves entry k of the batch to entry w.
+inline void MoveBatchEntry(WetFaceBatch& b, int k, int w) {
+  b.face[w] = b.face[k], b.position[w] = b.position[k];
+  b.hl[w] = b.hl[k], b.hr[w] = b.hr[k], b.dl[w] = b.dl[k], b.dr[w] = b.dr[k];
+  b.Pl[w] = b.Pl[k], b.Pr[w] = b.Pr[k], b.Ql[w] = b.Ql[k], b.Qr[w] = b.Qr[k];
+  b.kl[w] = b.kl[k], b.kr[w] = b.kr[k], b.etal[w] = b.etal[k], b.etar[w] = b.etar[k];
+  b.Dx[w] = b.Dx[k], b.Dy[w] = b.Dy[k], b.umax[w] = b.umax[k], b.vmax[w] = b.vmax[k];
 }
 
 // Fluxes and side contributions of the plain wet faces of a batch, the
@@ -503,24 +513,155 @@ void WetFaceFluxes(const FaceLoopInput& in, WetFaceBatch& b, int first, int last
   }
 }
 
-// Interior faces first .. last of the face list, in batches.
+// Second order: the faces of a chunk with two wet sides that keep their
+// reconstruction (no fall-back to first order) are gathered side by side and
+// their face values formed in vector lanes, exactly as FaceSideValues forms
+// them, into the flux batch (entry k of both batches is the same face).
+struct ReconstructionBatch {
+  int L[kFaceBatch], R[kFaceBatch];
+  // Centre values of each side, their gradients, the offsets from the
+  // centroids to the face centre, and the face still water depth.
+  double etaL[kFaceBatch], etaR[kFaceBatch], PL[kFaceBatch], PR[kFaceBatch], QL[kFaceBatch], QR[kFaceBatch];
+  double dL[kFaceBatch], dR[kFaceBatch], hL[kFaceBatch], hR[kFaceBatch], df[kFaceBatch];
+  double exL[kFaceBatch], eyL[kFaceBatch], PxL[kFaceBatch], PyL[kFaceBatch], QxL[kFaceBatch], QyL[kFaceBatch];
+  double exR[kFaceBatch], eyR[kFaceBatch], PxR[kFaceBatch], PyR[kFaceBatch], QxR[kFaceBatch], QyR[kFaceBatch];
+  double ax[kFaceBatch], ay[kFaceBatch], bx[kFaceBatch], by[kFaceBatch];
+  double eta_l[kFaceBatch], eta_r[kFaceBatch];  // eta at the face
+};
+
+inline void AddReconstructedFace(const FaceLoopInput& in, WetFaceBatch& b, ReconstructionBatch& rb, int f,
+                                 int position, int L, int R) {
+  const int i = AddBatchFace(in, b, f, position, L, R);
+  rb.L[i] = L, rb.R[i] = R;
+  rb.etaL[i] = in.eta[L], rb.etaR[i] = in.eta[R], rb.PL[i] = in.P[L], rb.PR[i] = in.P[R];
+  rb.QL[i] = in.Q[L], rb.QR[i] = in.Q[R], rb.dL[i] = in.d[L], rb.dR[i] = in.d[R];
+  rb.hL[i] = in.h[L], rb.hR[i] = in.h[R], rb.df[i] = in.face_d[f];
+  rb.exL[i] = in.eta_x[L], rb.eyL[i] = in.eta_y[L], rb.PxL[i] = in.P_x[L], rb.PyL[i] = in.P_y[L];
+  rb.QxL[i] = in.Q_x[L], rb.QyL[i] = in.Q_y[L];
+  rb.exR[i] = in.eta_x[R], rb.eyR[i] = in.eta_y[R], rb.PxR[i] = in.P_x[R], rb.PyR[i] = in.P_y[R];
+  rb.QxR[i] = in.Q_x[R], rb.QyR[i] = in.Q_y[R];
+  const double xf = in.xf[f], yf = in.yf[f];
+  rb.ax[i] = xf - in.xc[L], rb.ay[i] = yf - in.yc[L], rb.bx[i] = xf - in.xc[R], rb.by[i] = yf - in.yc[R];
+}
+
+// Face values of the gathered faces and the velocity bound of each face from
+// the centre velocities of its (wet) sides, the settings fixed at compile
+// time.
+template <bool kClip, bool kKeepSign, bool kFaceDepth>
+[[gnu::noinline]] void ReconstructFaces(ReconstructionBatch& rb, WetFaceBatch& b, double h_move) {
+  const int n = b.n;
+  // Keeps the sign of the jump of the centre values ca, cb at the face.
+  auto keep = [](double& a, double& c, double ca, double cb) {
+    const bool opposite = (c - a) * (cb - ca) < 0;
+    const double mean = 0.5 * (a + c);
+    a = opposite ? mean : a;
+    c = opposite ? mean : c;
+  };
+  VHD_OMP_SIMD
+  for (int i = 0; i < n; ++i) {
+    const double ax = rb.ax[i], ay = rb.ay[i], bx = rb.bx[i], by = rb.by[i];
+    double el = rb.etaL[i] + (rb.exL[i] * ax + rb.eyL[i] * ay);
+    double Pl = rb.PL[i] + (rb.PxL[i] * ax + rb.PyL[i] * ay);
+    double Ql = rb.QL[i] + (rb.QxL[i] * ax + rb.QyL[i] * ay);
+    double er = rb.etaR[i] + (rb.exR[i] * bx + rb.eyR[i] * by);
+    double Pr = rb.PR[i] + (rb.PxR[i] * bx + rb.PyR[i] * by);
+    double Qr = rb.QR[i] + (rb.QxR[i] * bx + rb.QyR[i] * by);
+    if constexpr (kClip) {
+      el = Clip(el, rb.etaL[i], rb.etaR[i]), er = Clip(er, rb.etaL[i], rb.etaR[i]);
+      Pl = Clip(Pl, rb.PL[i], rb.PR[i]), Pr = Clip(Pr, rb.PL[i], rb.PR[i]);
+      Ql = Clip(Ql, rb.QL[i], rb.QR[i]), Qr = Clip(Qr, rb.QL[i], rb.QR[i]);
+    }
+    if constexpr (kKeepSign) {
+      keep(el, er, rb.etaL[i], rb.etaR[i]);
+      keep(Pl, Pr, rb.PL[i], rb.PR[i]);
+      keep(Ql, Qr, rb.QL[i], rb.QR[i]);
+    }
+    if constexpr (kFaceDepth) {
+      b.dl[i] = std::max(rb.df[i], -el), b.dr[i] = std::max(rb.df[i], -er);
+      b.hl[i] = el + b.dl[i], b.hr[i] = er + b.dr[i];
+    } else {
+      b.dl[i] = rb.dL[i], b.dr[i] = rb.dR[i], b.hl[i] = rb.hL[i], b.hr[i] = rb.hR[i];
+    }
+    rb.eta_l[i] = el, rb.eta_r[i] = er;
+    b.Pl[i] = Pl, b.Pr[i] = Pr, b.Ql[i] = Ql, b.Qr[i] = Qr;
+    // Carried velocities of the wet sides (CarriedVelocity).
+    const double hL = rb.hL[i], hR = rb.hR[i];
+    const double invL = 1.0 / hL, invR = 1.0 / hR;
+    const bool movesL = hL >= h_move && hL > 0, movesR = hR >= h_move && hR > 0;
+    const double uL = movesL ? rb.PL[i] * invL : 0.0, vL = movesL ? rb.QL[i] * invL : 0.0;
+    const double uR = movesR ? rb.PR[i] * invR : 0.0, vR = movesR ? rb.QR[i] * invR : 0.0;
+    b.umax[i] = std::max(std::abs(uL), std::abs(uR));
+    b.vmax[i] = std::max(std::abs(vL), std::abs(vR));
+  }
+}
+
+void ReconstructFaces(const FaceLoopInput& in, ReconstructionBatch& rb, WetFaceBatch& b) {
+  auto with = [&](auto clip, auto keep_sign) {
+    if (in.fad != 0) {
+      ReconstructFaces<clip, keep_sign, true>(rb, b, in.h_move);
+    } else {
+      ReconstructFaces<clip, keep_sign, false>(rb, b, in.h_move);
+    }
+  };
+  auto with_clip = [&](auto clip) {
+    if (in.preserve_dU) {
+      with(clip, std::true_type{});
+    } else {
+      with(clip, std::false_type{});
+    }
+  };
+  if (in.face_value_limiter > 0) {
+    with_clip(std::true_type{});
+  } else {
+    with_clip(std::false_type{});
+  }
+}
+
+// Interior faces first .. last of the face list, in batches. Every face that
+// is not batched takes InteriorFaceTerms.
 template <bool kSecond>
 void InteriorFaceChunk(const FaceLoopInput& in, HdSolver& s, double* face_flux, double* face_flux_len,
-                       const int* faces, int first_index, int last_index, WetFaceBatch& b) {
+                       const int* faces, int first_index, int last_index, WetFaceBatch& b, ReconstructionBatch& rb) {
   b.n = 0;
   for (int i = first_index; i <= last_index; ++i) {
     const int f = faces[i];
+    const int L = in.e1[f], R = in.e2[f];
+    if constexpr (kSecond) {
+      if (s.vector_faces && in.code[L] == kWet && in.code[R] == kWet) {
+        const double hL = in.h[L], hR = in.h[R], limit = FallBackDepth(in, hL, hR);
+        if (!(in.face_limit_dry && (limit > hL || limit > hR))) {
+          AddReconstructedFace(in, b, rb, f, i, L, R);
+          continue;
+        }
+      }
+    }
     SideValues l, r;
     bool first;
     if (!WetFaceValues<kSecond>(in, s, face_flux, face_flux_len, f, l, r, first)) continue;
-    const int L = in.e1[f], R = in.e2[f];
     const bool plain = in.code[L] == kWet && in.code[R] == kWet && l.h >= in.h_move && r.h >= in.h_move &&
                        l.h > riemann_detail::kDryDepth && r.h > riemann_detail::kDryDepth;
-    if (plain && s.vector_faces) {
-      AddWetFace<kSecond>(in, b, f, i, L, R, l, r, first);
+    if (!kSecond && plain && s.vector_faces) {
+      AddWetFace(in, b, f, i, L, R, l, r);
     } else {
       InteriorFaceTerms<kSecond>(in, s, face_flux, face_flux_len, f, i, l, r, first, 1.0);
     }
+  }
+  if constexpr (kSecond) {
+    // The faces whose sides are too thin at the face for the batch leave it.
+    ReconstructFaces(in, rb, b);
+    int w = 0;
+    for (int k = 0; k < b.n; ++k) {
+      if (b.hl[k] >= in.h_move && b.hr[k] >= in.h_move && b.hl[k] > riemann_detail::kDryDepth &&
+          b.hr[k] > riemann_detail::kDryDepth) {
+        if (w != k) MoveBatchEntry(b, k, w);
+        ++w;
+      } else {
+        const SideValues l{rb.eta_l[k], b.Pl[k], b.Ql[k], b.dl[k], b.hl[k]};
+        const SideValues r{rb.eta_r[k], b.Pr[k], b.Qr[k], b.dr[k], b.hr[k]};
+        InteriorFaceTerms<true>(in, s, face_flux, face_flux_len, b.face[k], b.position[k], l, r, false, 1.0);
+      }
+    }
+    b.n = w;
   }
   WetFaceFluxes<kSecond>(in, b, first_index, last_index);
   for (int i = 0; i < b.n; ++i) {
@@ -596,13 +737,14 @@ void FaceTerms(HdModule& hd, HdSolver& s, const Mesh& mesh, const FaceLoopInput&
   const int* faces = s.interior_faces.data();
   const int nchunks = (ni + kFaceBatch - 1) / kFaceBatch;
   WetFaceBatch batch;  // one per thread, on its stack
+  ReconstructionBatch reconstruction;
   VHD_OMP_FOR_NOWAIT
   for (int c = 0; c < nchunks; ++c) {
     const int first = 1 + c * kFaceBatch, last = std::min(ni, (c + 1) * kFaceBatch);
     if (in.second) {
-      InteriorFaceChunk<true>(in, s, face_flux, face_flux_len, faces, first, last, batch);
+      InteriorFaceChunk<true>(in, s, face_flux, face_flux_len, faces, first, last, batch, reconstruction);
     } else {
-      InteriorFaceChunk<false>(in, s, face_flux, face_flux_len, faces, first, last, batch);
+      InteriorFaceChunk<false>(in, s, face_flux, face_flux_len, faces, first, last, batch, reconstruction);
     }
   }
 
