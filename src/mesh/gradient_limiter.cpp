@@ -5,6 +5,7 @@
 #include <algorithm>
 #include <array>
 #include <string>
+#include <type_traits>
 #include <utility>
 
 #include "core/omp.hpp"
@@ -64,12 +65,12 @@ struct BarthJespersenFields {
 // bit, written as selects (every face evaluated; an inactive face neither
 // widens the bounds nor limits) so that the element loop runs in vector
 // lanes. kFlags: element flags given (else every element is active).
-template <bool kFlags, int n>
+template <bool kFlags, int n, int kFaces>
 void BarthJespersenTableLanes(const LimiterGeometry2D& g, const int* flag, const BarthJespersenFields<n>& f,
                               double eps) {
-  const auto* neighbour = g.neighbour.data();
-  const auto* offset_x = g.dx.data();
-  const auto* offset_y = g.dy.data();
+  const int* neighbour = g.neighbour.data();
+  const double* offset_x = g.dx.data();
+  const double* offset_y = g.dy.data();
   const int nelements = g.nelements;
   // Local copies of the field pointers: the loop stores through doubles
   // cannot change them, so the fields unrolled below stay in vector lanes.
@@ -82,10 +83,10 @@ void BarthJespersenTableLanes(const LimiterGeometry2D& g, const int* flag, const
     // element itself, which leaves the bounds as they are. The index is
     // chosen by arithmetic, not by a condition: a load under a condition
     // keeps the loop out of vector lanes.
-    int source[kLimiterFaces2D];
-    bool active[kLimiterFaces2D];
-    for (int j = 0; j < kLimiterFaces2D; ++j) {
-      const int nb = neighbour[e][j];
+    int source[kFaces];
+    bool active[kFaces];
+    for (int j = 0; j < kFaces; ++j) {
+      const int nb = neighbour[e * kFaces + j];
       active[j] = own & (nb != 0);
       if constexpr (kFlags) active[j] = active[j] & (flag[nb] == 1);  // flag[0] is a spare slot
       source[j] = e + (nb - e) * static_cast<int>(active[j]);
@@ -96,11 +97,11 @@ void BarthJespersenTableLanes(const LimiterGeometry2D& g, const int* flag, const
       const double pe = p[e];
       const double gx = gx_in[k][e], gy = gy_in[k][e];
       double pmax = pe, pmin = pe, rise = 0.0, fall = 0.0;
-      for (int j = 0; j < kLimiterFaces2D; ++j) {
+      for (int j = 0; j < kFaces; ++j) {
         const double q = p[source[j]];
         pmax = std::max(pmax, q);
         pmin = std::min(pmin, q);
-        const double offset = gx * offset_x[e][j] + gy * offset_y[e][j];  // formed for every face: a select, not a load
+        const double offset = gx * offset_x[e * kFaces + j] + gy * offset_y[e * kFaces + j];  // formed for every face: a select, not a load
         const double d = active[j] ? offset : 0.0;
         rise = std::max(rise, d);
         fall = std::min(fall, d);
@@ -115,10 +116,17 @@ void BarthJespersenTableLanes(const LimiterGeometry2D& g, const int* flag, const
 template <int n>
 void BarthJespersenTable(const LimiterGeometry2D& g, const Array1<int>& element_flags,
                          const BarthJespersenFields<n>& f, double eps) {
-  if (element_flags.empty()) {
-    BarthJespersenTableLanes<false, n>(g, nullptr, f, eps);
+  auto with = [&](auto faces) {
+    if (element_flags.empty()) {
+      BarthJespersenTableLanes<false, n, faces>(g, nullptr, f, eps);
+    } else {
+      BarthJespersenTableLanes<true, n, faces>(g, element_flags.data(), f, eps);
+    }
+  };
+  if (g.faces == 3) {
+    with(std::integral_constant<int, 3>{});
   } else {
-    BarthJespersenTableLanes<true, n>(g, element_flags.data(), f, eps);
+    with(std::integral_constant<int, kLimiterFaces2D>{});
   }
 }
 
@@ -231,20 +239,26 @@ void SetupLimiterGeometry2D(const Mesh& mesh, LimiterGeometry2D& geometry) {
   const bool geo = IsGeographic(mesh.projection);
   LimiterGeometry2D& g = geometry;
   g.nelements = el.nelements_int > 0 ? el.nelements_int : el.nelements;
-  g.neighbour.assign(g.nelements, {0, 0, 0, 0});
-  g.dx.assign(g.nelements, {0.0, 0.0, 0.0, 0.0});
-  g.dy.assign(g.nelements, {0.0, 0.0, 0.0, 0.0});
+  g.faces = 3;
   for (int e = 1; e <= g.nelements; ++e) {
     if (ElementFaceCount(el, e) > kLimiterFaces2D)
       FatalError(SubstituteValue(
           SubstituteValue("SetupLimiterGeometry2D: element % has % faces; a 2D element has at most 4", el.id[e]),
           ElementFaceCount(el, e)));
+    g.faces = std::max(g.faces, ElementFaceCount(el, e));
+  }
+  const std::size_t size = static_cast<std::size_t>(g.nelements + 1) * g.faces;
+  g.neighbour.assign(size, 0);
+  g.dx.assign(size, 0.0);
+  g.dy.assign(size, 0.0);
+  for (int e = 1; e <= g.nelements; ++e) {
     for (int j = 0; j < ElementFaceCount(el, e); ++j) {
       const int f = el.face_list[el.face_start[e] + j];
       if (f == 0) continue;
-      g.neighbour[e][j] = fc.element1[f] == e ? fc.element2[f] : fc.element1[f];
-      g.dx[e][j] = detail::DeltaX(el.xc[e], fc.xf[f], geo);
-      g.dy[e][j] = fc.yf[f] - el.yc[e];
+      const std::size_t k = static_cast<std::size_t>(e) * g.faces + j;
+      g.neighbour[k] = fc.element1[f] == e ? fc.element2[f] : fc.element1[f];
+      g.dx[k] = detail::DeltaX(el.xc[e], fc.xf[f], geo);
+      g.dy[k] = fc.yf[f] - el.yc[e];
     }
   }
 }

@@ -52,6 +52,8 @@
 
 #include "core/array1.hpp"
 #include "mesh/gradient.hpp"
+#include <vector>
+
 #include "mesh/mesh.hpp"
 
 namespace vhd {
@@ -61,19 +63,22 @@ inline constexpr int kLimiterENO = 1;
 inline constexpr int kLimiterWeighted = 2;
 inline constexpr int kLimiterBarthJespersen = 3;
 
-// Local faces per element in the 2D limiter table (triangles use 3 slots).
+// Most local faces per element in the 2D limiter table.
 inline constexpr int kLimiterFaces2D = 4;
 
 // Per-element neighbours and face-centre offsets of a 2D mesh, in the
-// element's local face order. Slot j of element e: neighbour[e][j] is the
-// element across local face j+1 (0: boundary face, or the unused fourth slot
-// of a triangle), (dx, dy)[e][j] the face centre minus e's centroid (x taken
-// the short way round the globe on a geographic mesh). 80 bytes per element;
+// element's local face order, `faces` slots per element: 3 when every owned
+// element is a triangle, else 4. Slot j of element e (index e * faces + j):
+// neighbour is the element across local face j+1 (0: boundary face, or the
+// unused fourth slot of a triangle), (dx, dy) the face centre minus e's
+// centroid (x taken the short way round the globe on a geographic mesh).
+// 60 bytes per element on a triangle mesh, 80 with quadrilaterals;
 // neighbours may be halo elements, whose values the limiter reads.
 struct LimiterGeometry2D {
   int nelements = 0;  // rows: the owned elements, which the limiter loops visit
-  Array1<std::array<int, kLimiterFaces2D>> neighbour;
-  Array1<std::array<double, kLimiterFaces2D>> dx, dy;
+  int faces = 0;
+  std::vector<int> neighbour;
+  std::vector<double> dx, dy;
 };
 
 // Builds the table of the owned elements of a 2D mesh (the table is

@@ -21,7 +21,7 @@ namespace vhd::test {
 // wrapped messages joined to their first line.
 inline std::string JoinedOutput(const std::string& path) {
   std::string text = ReadTextFile(path);
-  const std::string continuation = "\n" + std::string(14, ' ');
+  const std::string continuation = std::string("\n").append(14, ' ');
   for (std::size_t at = text.find(continuation); at != std::string::npos; at = text.find(continuation, at))
     text.erase(at, continuation.size());
   return text;
