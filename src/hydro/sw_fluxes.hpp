@@ -99,9 +99,7 @@ struct HdSolver {
 
   // Face planes: every element has face_planes slots (the largest face count
   // of the mesh's elements: 3 for triangles, 4 with quadrilaterals); the slot
-  // of local face j (0-based) of element e is j * plane_stride + e. Plane by
-  // plane, the element passes read their slots one after the other in vector
-  // lanes.
+  // of local face j (0-based) of element e is j * plane_stride + e.
   int face_planes = 0;
   int plane_stride = 0;
 
