@@ -638,9 +638,10 @@ void InteriorFaceChunk(const FaceLoopInput& in, HdSolver& s, double* face_flux, 
     SideValues l, r;
     bool first;
     if (!WetFaceValues<kSecond>(in, s, face_flux, face_flux_len, f, l, r, first)) continue;
+    // First order: plain wet faces into the batch with their face values.
     const bool plain = in.code[L] == kWet && in.code[R] == kWet && l.h >= in.h_move && r.h >= in.h_move &&
                        l.h > riemann_detail::kDryDepth && r.h > riemann_detail::kDryDepth;
-    if (!kSecond && plain && s.vector_faces) {
+    if (!kSecond && s.vector_faces && plain) {
       AddWetFace(in, b, f, i, L, R, l, r);
     } else {
       InteriorFaceTerms<kSecond>(in, s, face_flux, face_flux_len, f, i, l, r, first, 1.0);
@@ -767,9 +768,9 @@ void FaceTerms(HdModule& hd, HdSolver& s, const Mesh& mesh, const FaceLoopInput&
 
 // Sums of the face terms of element e in its local face order (its slots of
 // the planes, kPlanes of them; a slot beyond the element's faces adds zero):
-// the water leaving it (sh, with the sign of the side), the momentum terms,
-// and the outflow (the leaving water of the faces that carry it out). mass
-// is HdState::face_flux_len.
+// the water entering it (sh: the face mass fluxes with the sign of the
+// element's side), the momentum terms, and the outflow (the sum of the
+// faces' outgoing water). mass is HdState::face_flux_len.
 template <int kPlanes>
 [[gnu::always_inline]] inline void ElementSums(const HdSolver& s, const double* mass, int e, double& sh, double& sP,
                                                double& sQ, double& out) {
