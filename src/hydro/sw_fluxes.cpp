@@ -158,14 +158,24 @@ void LandFaceTerms(const FaceLoopInput& in, HdSolver& s, const BoundaryFaceRecor
 // Velocity (m/s) with which water leaving element e carries momentum: its
 // centre velocity when it is wet and at least h_move deep, else 0 (flooded
 // elements count as at rest, as in the fluxes).
+// (Selects, so that the batched face loop runs it in vector lanes.)
+inline void CarriedVelocity(bool wet, double h, double P, double Q, double h_move, double& u, double& v) {
+  const bool moves = wet && h >= h_move && h > 0;
+  const double inv = 1.0 / h;
+  u = moves ? P * inv : 0.0;
+  v = moves ? Q * inv : 0.0;
+}
+
 inline void CarriedVelocity(const int* code, const double* h, const double* P, const double* Q, double h_move,
                             int e, double& u, double& v) {
-  u = v = 0.0;
-  if (code[e] == kWet && h[e] >= h_move && h[e] > 0) {
-    const double inv = 1.0 / h[e];
-    u = P[e] * inv;
-    v = Q[e] * inv;
-  }
+  CarriedVelocity(code[e] == kWet, h[e], P[e], Q[e], h_move, u, v);
+}
+
+// Bound of each velocity component at a face: the larger magnitude of that
+// component of the velocities carried by its two sides.
+inline void FaceVelocityBound(double uL, double vL, double uR, double vR, double& umax, double& vmax) {
+  umax = std::max(std::abs(uL), std::abs(uR));
+  vmax = std::max(std::abs(vL), std::abs(vR));
 }
 
 // Bounds the face velocity of a side componentwise by umax, vmax; the
@@ -193,6 +203,33 @@ void ZeroFace(HdSolver& s, int f) { SetFaceTerms(s, f, 0.0, 0.0, 0.0, 0.0); }
 // order (with face_limit_dry), from the centre depths of its sides.
 inline double FallBackDepth(const FaceLoopInput& in, double hL, double hR) { return 0.05 * (in.h_min + hL + hR); }
 
+// Whether a second-order face between sides of centre depths hL, hR falls
+// back to first order.
+inline bool FallsBackToFirstOrder(const FaceLoopInput& in, double hL, double hR) {
+  const double limit = FallBackDepth(in, hL, hR);
+  return in.face_limit_dry && (limit > hL || limit > hR);
+}
+
+// Whether both sides are deep enough at the face for the batched flux.
+inline bool PlainFaceDepths(const FaceLoopInput& in, double hl, double hr) {
+  return hl >= in.h_move && hr >= in.h_move && hl > riemann_detail::kDryDepth && hr > riemann_detail::kDryDepth;
+}
+
+// Face values a, c of one field on the two sides of a face from the centre
+// values ca, cb and the reconstructed increments da, dc: clipped to the
+// range of the centre values (clip), and both set to their mean where their
+// jump has the opposite sign to the jump of the centre values (keep_sign).
+inline void FieldFaceValues(double ca, double cb, double da, double dc, bool clip, bool keep_sign, double& a,
+                            double& c) {
+  a = ca + da;
+  c = cb + dc;
+  if (clip) a = Clip(a, ca, cb), c = Clip(c, ca, cb);
+  const bool opposite = keep_sign && (c - a) * (cb - ca) < 0;
+  const double mean = 0.5 * (a + c);
+  a = opposite ? mean : a;
+  c = opposite ? mean : c;
+}
+
 // Face values of the two sides of interior face f (l, r hold the centre
 // values on entry): with second order the reconstructed values, clipped and
 // sign-kept as the settings ask; then the face d and face depth of each side.
@@ -204,36 +241,19 @@ template <bool kSecond>
   const double hL = l.h, hR = r.h;
   bool first = !kSecond;
   if constexpr (kSecond) {
+    first = FallsBackToFirstOrder(in, hL, hR);
     const double limit = FallBackDepth(in, hL, hR);
-    first = in.face_limit_dry && (limit > hL || limit > hR);
     if (first && in.fad != 0 && (limit > hL) != (limit > hR)) VelocityAtFaceDepth(limit > hL ? r : l, in.face_d[f]);
     if (!first) {
       const double xf = in.xf[f], yf = in.yf[f];
       const double ax = xf - in.xc[L], ay = yf - in.yc[L], bx = xf - in.xc[R], by = yf - in.yc[R];
-      const double PL = l.P, PR = r.P, QL = l.Q, QR = r.Q;
-      l.eta += in.eta_x[L] * ax + in.eta_y[L] * ay;
-      l.P += in.P_x[L] * ax + in.P_y[L] * ay;
-      l.Q += in.Q_x[L] * ax + in.Q_y[L] * ay;
-      r.eta += in.eta_x[R] * bx + in.eta_y[R] * by;
-      r.P += in.P_x[R] * bx + in.P_y[R] * by;
-      r.Q += in.Q_x[R] * bx + in.Q_y[R] * by;
-      if (in.face_value_limiter > 0) {
-        l.eta = Clip(l.eta, etaL, etaR), r.eta = Clip(r.eta, etaL, etaR);
-        l.P = Clip(l.P, PL, PR), r.P = Clip(r.P, PL, PR);
-        l.Q = Clip(l.Q, QL, QR), r.Q = Clip(r.Q, QL, QR);
-      }
-      if (in.preserve_dU) {
-        // Keep the sign of the jump of the centre values at the face.
-        auto keep = [](double& a, double& b, double ca, double cb) {
-          const bool opposite = (b - a) * (cb - ca) < 0;
-          const double mean = 0.5 * (a + b);
-          a = opposite ? mean : a;
-          b = opposite ? mean : b;
-        };
-        keep(l.eta, r.eta, etaL, etaR);
-        keep(l.P, r.P, PL, PR);
-        keep(l.Q, r.Q, QL, QR);
-      }
+      const bool clip = in.face_value_limiter > 0, keep = in.preserve_dU;
+      FieldFaceValues(etaL, etaR, in.eta_x[L] * ax + in.eta_y[L] * ay, in.eta_x[R] * bx + in.eta_y[R] * by, clip,
+                      keep, l.eta, r.eta);
+      FieldFaceValues(l.P, r.P, in.P_x[L] * ax + in.P_y[L] * ay, in.P_x[R] * bx + in.P_y[R] * by, clip, keep, l.P,
+                      r.P);
+      FieldFaceValues(l.Q, r.Q, in.Q_x[L] * ax + in.Q_y[L] * ay, in.Q_x[R] * bx + in.Q_y[R] * by, clip, keep, l.Q,
+                      r.Q);
     }
   }
   // Face d and face depths from d_f, except with face_average_d 0 and at the
@@ -299,11 +319,12 @@ void InteriorFaceTerms(const FaceLoopInput& in, HdSolver& s, double* face_flux, 
       // that component at the two centres (P follows), which leaves smooth
       // flow alone and keeps thin water from being flung out.
       if (!first) {
-        double uL, vL, uR, vR;
+        double uL, vL, uR, vR, umax, vmax;
         CarriedVelocity(in.code, in.h, in.P, in.Q, in.h_move, L, uL, vL);
         CarriedVelocity(in.code, in.h, in.P, in.Q, in.h_move, R, uR, vR);
-        BoundVelocity(sl, std::max(std::abs(uL), std::abs(uR)), std::max(std::abs(vL), std::abs(vR)));
-        BoundVelocity(sr, std::max(std::abs(uL), std::abs(uR)), std::max(std::abs(vL), std::abs(vR)));
+        FaceVelocityBound(uL, vL, uR, vR, umax, vmax);
+        BoundVelocity(sl, umax, vmax);
+        BoundVelocity(sr, umax, vmax);
       }
     }
     RiemannFlux F =
@@ -550,48 +571,27 @@ inline void AddReconstructedFace(const FaceLoopInput& in, WetFaceBatch& b, Recon
 template <bool kClip, bool kKeepSign, bool kFaceDepth>
 [[gnu::noinline]] void ReconstructFaces(ReconstructionBatch& rb, WetFaceBatch& b, double h_move) {
   const int n = b.n;
-  // Keeps the sign of the jump of the centre values ca, cb at the face.
-  auto keep = [](double& a, double& c, double ca, double cb) {
-    const bool opposite = (c - a) * (cb - ca) < 0;
-    const double mean = 0.5 * (a + c);
-    a = opposite ? mean : a;
-    c = opposite ? mean : c;
-  };
   VHD_OMP_SIMD
   for (int i = 0; i < n; ++i) {
     const double ax = rb.ax[i], ay = rb.ay[i], bx = rb.bx[i], by = rb.by[i];
-    double el = rb.etaL[i] + (rb.exL[i] * ax + rb.eyL[i] * ay);
-    double Pl = rb.PL[i] + (rb.PxL[i] * ax + rb.PyL[i] * ay);
-    double Ql = rb.QL[i] + (rb.QxL[i] * ax + rb.QyL[i] * ay);
-    double er = rb.etaR[i] + (rb.exR[i] * bx + rb.eyR[i] * by);
-    double Pr = rb.PR[i] + (rb.PxR[i] * bx + rb.PyR[i] * by);
-    double Qr = rb.QR[i] + (rb.QxR[i] * bx + rb.QyR[i] * by);
-    if constexpr (kClip) {
-      el = Clip(el, rb.etaL[i], rb.etaR[i]), er = Clip(er, rb.etaL[i], rb.etaR[i]);
-      Pl = Clip(Pl, rb.PL[i], rb.PR[i]), Pr = Clip(Pr, rb.PL[i], rb.PR[i]);
-      Ql = Clip(Ql, rb.QL[i], rb.QR[i]), Qr = Clip(Qr, rb.QL[i], rb.QR[i]);
-    }
-    if constexpr (kKeepSign) {
-      keep(el, er, rb.etaL[i], rb.etaR[i]);
-      keep(Pl, Pr, rb.PL[i], rb.PR[i]);
-      keep(Ql, Qr, rb.QL[i], rb.QR[i]);
-    }
+    SideValues l{0.0, 0.0, 0.0, rb.dL[i], rb.hL[i]}, r{0.0, 0.0, 0.0, rb.dR[i], rb.hR[i]};
+    FieldFaceValues(rb.etaL[i], rb.etaR[i], rb.exL[i] * ax + rb.eyL[i] * ay, rb.exR[i] * bx + rb.eyR[i] * by, kClip,
+                    kKeepSign, l.eta, r.eta);
+    FieldFaceValues(rb.PL[i], rb.PR[i], rb.PxL[i] * ax + rb.PyL[i] * ay, rb.PxR[i] * bx + rb.PyR[i] * by, kClip,
+                    kKeepSign, l.P, r.P);
+    FieldFaceValues(rb.QL[i], rb.QR[i], rb.QxL[i] * ax + rb.QyL[i] * ay, rb.QxR[i] * bx + rb.QyR[i] * by, kClip,
+                    kKeepSign, l.Q, r.Q);
     if constexpr (kFaceDepth) {
-      b.dl[i] = std::max(rb.df[i], -el), b.dr[i] = std::max(rb.df[i], -er);
-      b.hl[i] = el + b.dl[i], b.hr[i] = er + b.dr[i];
-    } else {
-      b.dl[i] = rb.dL[i], b.dr[i] = rb.dR[i], b.hl[i] = rb.hL[i], b.hr[i] = rb.hR[i];
+      FaceDepth(l, rb.df[i]);
+      FaceDepth(r, rb.df[i]);
     }
-    rb.eta_l[i] = el, rb.eta_r[i] = er;
-    b.Pl[i] = Pl, b.Pr[i] = Pr, b.Ql[i] = Ql, b.Qr[i] = Qr;
-    // Carried velocities of the wet sides (CarriedVelocity).
-    const double hL = rb.hL[i], hR = rb.hR[i];
-    const double invL = 1.0 / hL, invR = 1.0 / hR;
-    const bool movesL = hL >= h_move && hL > 0, movesR = hR >= h_move && hR > 0;
-    const double uL = movesL ? rb.PL[i] * invL : 0.0, vL = movesL ? rb.QL[i] * invL : 0.0;
-    const double uR = movesR ? rb.PR[i] * invR : 0.0, vR = movesR ? rb.QR[i] * invR : 0.0;
-    b.umax[i] = std::max(std::abs(uL), std::abs(uR));
-    b.vmax[i] = std::max(std::abs(vL), std::abs(vR));
+    rb.eta_l[i] = l.eta, rb.eta_r[i] = r.eta;
+    b.dl[i] = l.d, b.dr[i] = r.d, b.hl[i] = l.h, b.hr[i] = r.h;
+    b.Pl[i] = l.P, b.Pr[i] = r.P, b.Ql[i] = l.Q, b.Qr[i] = r.Q;
+    double uL, vL, uR, vR;
+    CarriedVelocity(true, rb.hL[i], rb.PL[i], rb.QL[i], h_move, uL, vL);
+    CarriedVelocity(true, rb.hR[i], rb.PR[i], rb.QR[i], h_move, uR, vR);
+    FaceVelocityBound(uL, vL, uR, vR, b.umax[i], b.vmax[i]);
   }
 }
 
@@ -628,8 +628,7 @@ void InteriorFaceChunk(const FaceLoopInput& in, HdSolver& s, double* face_flux, 
     const int L = in.e1[f], R = in.e2[f];
     if constexpr (kSecond) {
       if (s.vector_faces && in.code[L] == kWet && in.code[R] == kWet) {
-        const double hL = in.h[L], hR = in.h[R], limit = FallBackDepth(in, hL, hR);
-        if (!(in.face_limit_dry && (limit > hL || limit > hR))) {
+        if (!FallsBackToFirstOrder(in, in.h[L], in.h[R])) {
           AddReconstructedFace(in, b, rb, f, i, L, R);
           continue;
         }
@@ -639,8 +638,7 @@ void InteriorFaceChunk(const FaceLoopInput& in, HdSolver& s, double* face_flux, 
     bool first;
     if (!WetFaceValues<kSecond>(in, s, face_flux, face_flux_len, f, l, r, first)) continue;
     // First order: plain wet faces into the batch with their face values.
-    const bool plain = in.code[L] == kWet && in.code[R] == kWet && l.h >= in.h_move && r.h >= in.h_move &&
-                       l.h > riemann_detail::kDryDepth && r.h > riemann_detail::kDryDepth;
+    const bool plain = in.code[L] == kWet && in.code[R] == kWet && PlainFaceDepths(in, l.h, r.h);
     if (!kSecond && s.vector_faces && plain) {
       AddWetFace(in, b, f, i, L, R, l, r);
     } else {
@@ -652,8 +650,7 @@ void InteriorFaceChunk(const FaceLoopInput& in, HdSolver& s, double* face_flux, 
     ReconstructFaces(in, rb, b);
     int w = 0;
     for (int k = 0; k < b.n; ++k) {
-      if (b.hl[k] >= in.h_move && b.hr[k] >= in.h_move && b.hl[k] > riemann_detail::kDryDepth &&
-          b.hr[k] > riemann_detail::kDryDepth) {
+      if (PlainFaceDepths(in, b.hl[k], b.hr[k])) {
         if (w != k) MoveBatchEntry(b, k, w);
         ++w;
       } else {
