@@ -24,9 +24,8 @@ struct BoundCase {
   }
 
   // Generates the mesh (MakeCase) and reads the BOUNDARY_CONDITIONS sections
-  // given in `sections` (their TOML text, without the section path prefix
-  // "[VantorHD.HYDRODYNAMIC_MODULE.BOUNDARY_CONDITIONS"). nsteps overall
-  // steps make up the simulation (the coverage of data files).
+  // of `setup_text` (CodeSection). nsteps overall steps make up the
+  // simulation (the coverage of data files).
   void Make(const RectangleMeshSpec& spec, double overall_dt, int nsteps, const std::string& setup_text) {
     MakeCase(c, spec, overall_dt);
     c.hd.time_axis.dt = overall_dt;
@@ -39,23 +38,18 @@ struct BoundCase {
     SktCloseSection();
   }
 
-  // Initial state from functions of position, then the solver and the
-  // initial step (which brings the boundary values to t = 0).
+  // Initial state, solver and initial step (StartCase).
   void Start(const std::function<double(double, double)>& eta0,
              const std::function<double(double, double)>& u0 = {}) {
-    HdState& st = c.hd.state;
-    for (int e = 1; e <= st.nelements; ++e) {
-      const double x = c.mesh.elements.xc[e], y = c.mesh.elements.yc[e];
-      st.h[e] = std::max(0.0, eta0(x, y) + st.d[e]);
-      st.eta[e] = st.h[e] - st.d[e];
-      st.u[e] = u0 ? u0(x, y) : 0.0;
-      st.v[e] = 0.0;
-    }
-    CALCFLUXFROMVELOCITY(st);
-    InitialFloodDryCodesHD(c.hd, c.mesh);
-    SetupSolverHD(c.hd, c.mesh, c.solver);
-    InitialStepHD(c.hd, c.solver, c.mesh);
+    StartCase(c, eta0, u0);
   }
+
+  // The boundary face conditions of a code, j = 1 .. nfaces.
+  const BoundaryFaceCondition& Face(int code, int j) const {
+    const HdBoundary& bc = c.hd.boundary;
+    return bc.faces[bc.codes[code].first_face + j - 1];
+  }
+  int NFaces(int code) const { return c.hd.boundary.codes[code].nfaces; }
 
   // Sum of the face mass fluxes (m3/s, out of the domain positive) through
   // the faces of a boundary code.
@@ -85,20 +79,12 @@ struct BoundCase {
   SwCase c;
 };
 
-// A straight channel along x: nx x ny quadrilaterals of dx x dy, bed z(x, y),
-// codes of the four sides.
+// A straight channel along x: nx x ny cells of dx x dy, bed z(x, y), codes of
+// the four sides.
 inline RectangleMeshSpec Channel(int nx, int ny, double dx, double dy, std::function<double(double, double)> bed,
                                  int west, int east, int south = 1, int north = 1,
                                  CellLayout layout = CellLayout::kQuadrilaterals) {
-  RectangleMeshSpec s;
-  s.x0 = 0.0;
-  s.x1 = nx * dx;
-  s.y0 = 0.0;
-  s.y1 = ny * dy;
-  s.nx = nx;
-  s.ny = ny;
-  s.layout = layout;
-  s.bed = std::move(bed);
+  RectangleMeshSpec s = RectSpec(nx, ny, dx, dy, std::move(bed), layout);
   s.code_west = west;
   s.code_east = east;
   s.code_south = south;
@@ -107,7 +93,7 @@ inline RectangleMeshSpec Channel(int nx, int ny, double dx, double dy, std::func
 }
 
 inline std::string CodeSection(int code, const std::string& body) {
-  return "[VantorHD.HYDRODYNAMIC_MODULE.BOUNDARY_CONDITIONS.CODE_" + std::to_string(code) + "]\n" + body;
+  return HdSection("BOUNDARY_CONDITIONS.CODE_" + std::to_string(code), body);
 }
 
 }  // namespace vhd::test

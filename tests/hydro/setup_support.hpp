@@ -1,7 +1,9 @@
 #pragma once
-// Helpers of the HD module tests: a generated mesh with its geometry, a setup
-// file with a log in a fresh folder, and the text of the log with wrapped
-// message lines joined.
+// Helpers of the HD module tests: a generated mesh with its geometry, setup
+// texts, a setup file with a log in a fresh folder, and the text of the log
+// with wrapped message lines joined.
+
+#include <gtest/gtest.h>
 
 #include <functional>
 #include <string>
@@ -18,10 +20,9 @@
 
 namespace vhd::test {
 
-// nx x ny cells of size dx x dy (quadrilaterals unless triangles), bed z(x, y).
-inline Mesh MakeMesh(int nx, int ny, double dx, double dy, std::function<double(double, double)> bed = {},
-                     CellLayout layout = CellLayout::kQuadrilaterals, const std::string& projection = "NON-UTM",
-                     double x0 = 0.0, double y0 = 0.0) {
+// nx x ny cells of size dx x dy from (x0, y0), bed z(x, y).
+inline RectangleMeshSpec RectSpec(int nx, int ny, double dx, double dy, std::function<double(double, double)> bed,
+                                  CellLayout layout, double x0 = 0.0, double y0 = 0.0) {
   RectangleMeshSpec spec;
   spec.x0 = x0;
   spec.x1 = x0 + nx * dx;
@@ -31,11 +32,30 @@ inline Mesh MakeMesh(int nx, int ny, double dx, double dy, std::function<double(
   spec.ny = ny;
   spec.layout = layout;
   spec.bed = std::move(bed);
+  return spec;
+}
+
+// The mesh of RectSpec (quadrilaterals unless told) with its geometry.
+inline Mesh MakeMesh(int nx, int ny, double dx, double dy, std::function<double(double, double)> bed = {},
+                     CellLayout layout = CellLayout::kQuadrilaterals, const std::string& projection = "NON-UTM",
+                     double x0 = 0.0, double y0 = 0.0) {
+  RectangleMeshSpec spec = RectSpec(nx, ny, dx, dy, std::move(bed), layout, x0, y0);
   spec.projection = projection;
   Mesh mesh;
   GenerateRectangleMesh(spec, mesh);
   SetupMeshGeometry(mesh);
   return mesh;
+}
+
+// A flat bed `depth` metres below datum.
+inline std::function<double(double, double)> Flat(double depth) {
+  return [depth](double, double) { return -depth; };
+}
+
+// The HD module section with mode 2, and a subsection of it with its keys.
+inline const std::string kHd = "[VantorHD.HYDRODYNAMIC_MODULE]\nmode = 2\n";
+inline std::string HdSection(const std::string& path, const std::string& keys) {
+  return std::string("[VantorHD.HYDRODYNAMIC_MODULE.").append(path).append("]\n").append(keys);
 }
 
 // The log text with the continuation lines of wrapped messages joined to the
@@ -71,6 +91,14 @@ void InChild(F&& statement) {
   statement();
 }
 
+// Expects `statement` to stop the run and the log at log_path to hold `message`.
+template <class F>
+void ExpectStop(F&& statement, const std::string& log_path, const std::string& message) {
+  EXPECT_EXIT(InChild(statement), testing::ExitedWithCode(1), "");
+  const std::string log = JoinedLog(log_path);
+  EXPECT_NE(log.find(message), std::string::npos) << "expected: " << message << "\nlog: " << log;
+}
+
 // A setup file in a fresh folder, opened with its log, and one HD setup run
 // on a generated mesh.
 class HdSetupFixture {
@@ -94,6 +122,10 @@ public:
     meshes.clear();
     meshes.push_back(mesh);
     SetupHD(hd, run, time, modules, meshes);
+  }
+  // Expects the setup to stop with `message` in the log.
+  void ExpectSetupStops(const std::string& body, const Mesh& mesh, const std::string& message, int ndim = 2) {
+    ExpectStop([&] { Setup(body, mesh, 30.0, ndim); }, log_path, message);
   }
   std::string Log() const { return JoinedLog(log_path); }
 
