@@ -97,7 +97,6 @@ void WriteFace(HdState& st, HdSolver& s, int f, RiemannFlux F, bool wet, double 
     F.momx *= theta;
     F.momy *= theta;
   }
-  st.face_flux[f] = F.Fh;
   st.face_flux_len[f] = F.mass;
   if (wet) {
     SetBoundaryFaceTerms(s, f, -F.momx + bedslope * nx, -F.momy + bedslope * ny);
@@ -108,7 +107,7 @@ void WriteFace(HdState& st, HdSolver& s, int f, RiemannFlux F, bool wet, double 
 
 void ZeroFace(HdState& st, HdSolver& s, int f) {
   SetBoundaryFaceTerms(s, f, 0.0, 0.0);
-  st.face_flux[f] = st.face_flux_len[f] = 0.0;
+  st.face_flux_len[f] = 0.0;
 }
 
 // Cyclic face: the Riemann problem between the inner element and the element
@@ -130,7 +129,7 @@ void CyclicFace(HdModule& hd, HdSolver& s, const Mesh& mesh, const BoundaryFaceR
       BoundaryFaceRecord wall = rec;
       wall.kind = kBoundaryLand;
       BoundaryFaceTerms(hd, s, mesh, wall);
-      st.face_flux[f] = st.face_flux_len[f] = 0.0;
+      st.face_flux_len[f] = 0.0;
     } else {
       ZeroFace(st, s, f);
     }
@@ -142,9 +141,9 @@ void CyclicFace(HdModule& hd, HdSolver& s, const Mesh& mesh, const BoundaryFaceR
   double dc, hc, dp, hp;
   FaceDepth(st.eta[c], dm, dc, hc);
   FaceDepth(st.eta[p], dm, dp, hp);
-  const double kc = s.depth_correction[c];
+  const double kc = DepthCorrection(s, c);
   const RiemannSide L = MakeSide(st, c, dc, hc, kc, h_min);
-  const RiemannSide R = MakeSide(st, p, dp, hp, s.depth_correction[p], h_min);
+  const RiemannSide R = MakeSide(st, p, dp, hp, DepthCorrection(s, p), h_min);
   const HdSolutionTechnique& sol = hd.solution;
   const RiemannFlux F =
       RiemannFaceFlux(L, R, nx, ny, h_min, sol.type_of_Riemann_solver, sol.type_of_entropy_fix, len, g);
@@ -191,7 +190,7 @@ void BoundaryFaceFluxHD(HdModule& hd, HdSolver& s, const Mesh& mesh, const Bound
   const double g = kPhysical.g, h_min = hd.flood_dry.mass_depth;
   const double nx = mesh.faces.nx[f], ny = mesh.faces.ny[f], len = mesh.faces.length[f];
   const double df = st.face_d[f];
-  const double k = s.depth_correction[c];
+  const double k = DepthCorrection(s, c);
 
   // Inner state at the face, first order.
   double d = st.d[c], h = st.h[c];

@@ -105,10 +105,9 @@ struct HdState {
   // geographic meshes (empty on Cartesian meshes).
   Array1<double> cos_lat, tan_lat;
 
-  // Per face: mass flux per unit length (m2/s) and times the face length
-  // (m3/s), positive from element1 to element2; still water depth at the face
-  // used by the bed-slope term (m).
-  Array1<double> face_flux, face_flux_len, face_d;
+  // Per face: mass flux times the face length (m3/s), positive from element1
+  // to element2; still water depth at the face used by the bed-slope term (m).
+  Array1<double> face_flux_len, face_d;
 
   // Per node: bed level (m, negative below datum).
   Array1<double> z_node;

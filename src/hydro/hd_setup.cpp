@@ -159,7 +159,6 @@ void AllocateStateHD(HdModule& hd, const Mesh& mesh) {
   if (hd.eddy.horizontal.type > 0) AllocateVelocityGradientsHD(s);
   s.wetdry.assign(ne, kWet);
   s.wetdry_old.assign(ne, kWet);
-  s.face_flux.assign(s.nfaces, 0.0);
   s.face_flux_len.assign(s.nfaces, 0.0);
   s.face_d.assign(s.nfaces, 0.0);
   s.z_node.assign(s.nnodes, 0.0);

@@ -26,7 +26,7 @@ struct FaceLoopInput {
   const double* face_length;
   const double *eta, *d, *h, *P, *Q;
   const int* code;
-  const double* k;
+  const double* k;  // depth correction per element; null when none is active
   const double* face_d;
   bool second;
   const double *xf, *yf, *xc, *yc;  // face centres and centroids
@@ -112,7 +112,7 @@ void EddyFlux(double nu, double hf, double ux, double uy, double vx, double vy, 
 // length times the face length.
 inline void WallTerms(const FaceLoopInput& in, int e, const SideValues& side, double ox, double oy, double nn,
                       double nlen, double& mx, double& my) {
-  const double g = in.g, hs = side.h, k = in.k[e];
+  const double g = in.g, hs = side.h, k = in.k ? in.k[e] : 0.0;
   const double un = (hs >= in.h_min && hs > 0) ? (side.P * ox + side.Q * oy) * nn / hs : 0.0;
   const double hw = WallDepth(in.land_condition, un, hs, k, g);
   const double pw = 0.5 * g * (hw * hw - side.d * side.d) * nlen;
@@ -274,7 +274,7 @@ template <bool kSecond>
 // treatment of the wet side against a dry one, and the signed contributions
 // of each side (scaled by theta, the outflow factor of the upwind element).
 template <bool kSecond>
-void InteriorFaceTerms(const FaceLoopInput& in, HdSolver& s, double* face_flux, double* face_flux_len, int f,
+void InteriorFaceTerms(const FaceLoopInput& in, HdSolver& s, double* face_flux_len, int f,
                        int i, const SideValues& l, const SideValues& r, bool first, double theta) {
   const int L = in.e1[f], R = in.e2[f];
   const int cL = in.code[L], cR = in.code[R];
@@ -284,7 +284,7 @@ void InteriorFaceTerms(const FaceLoopInput& in, HdSolver& s, double* face_flux, 
   const double nlen = nn * in.len[i];  // length of the normal times the face length
 
   const bool riemann = RiemannFaceCase(cL, cR, etaL, in.d[L], etaR, in.d[R], kSecond);
-  const double kL = in.k[L], kR = in.k[R];
+  const double kL = in.k ? in.k[L] : 0.0, kR = in.k ? in.k[R] : 0.0;
   const double g = in.g;
   double Dx = 0.0, Dy = 0.0;
 
@@ -336,7 +336,6 @@ void InteriorFaceTerms(const FaceLoopInput& in, HdSolver& s, double* face_flux, 
                nlen, Dx, Dy);
     }
     const double fx = F.momx - Dx, fy = F.momy - Dy;
-    face_flux[f] = F.Fh;
     face_flux_len[f] = F.mass;
     // Bed-slope terms g X d |n| len of the wet sides (X = eta + k at the
     // centre) with the face d that the flux's pressure saw, so that pressure
@@ -370,7 +369,7 @@ void InteriorFaceTerms(const FaceLoopInput& in, HdSolver& s, double* face_flux, 
   }
 
   // Land treatment of the wet side.
-  face_flux[f] = face_flux_len[f] = 0.0;
+  face_flux_len[f] = 0.0;
   double mx, my;
   if (cL == kWet) {
     WallTerms(in, L, l, ex, ey, nn, nlen, mx, my);
@@ -385,12 +384,12 @@ void InteriorFaceTerms(const FaceLoopInput& in, HdSolver& s, double* face_flux, 
 // order (FaceSideValues); false for a face without a wet side, whose terms
 // are set to zero before any arithmetic.
 template <bool kSecond>
-[[gnu::always_inline]] inline bool WetFaceValues(const FaceLoopInput& in, HdSolver& s, double* face_flux, double* face_flux_len, int f,
+[[gnu::always_inline]] inline bool WetFaceValues(const FaceLoopInput& in, HdSolver& s, double* face_flux_len, int f,
                           SideValues& l, SideValues& r, bool& first) {
   const int L = in.e1[f], R = in.e2[f];
   if (in.code[L] != kWet && in.code[R] != kWet) {  // dry-dry (or flooded) faces carry nothing
     ZeroFace(s, f);
-    face_flux[f] = face_flux_len[f] = 0.0;
+    face_flux_len[f] = 0.0;
     return false;
   }
   l = {in.eta[L], in.P[L], in.Q[L], in.d[L], in.h[L]};
@@ -402,13 +401,13 @@ template <bool kSecond>
 // One interior face (position i in interior_faces), every case:
 // classification, face values, flux and the signed contributions of each side.
 template <bool kSecond>
-inline void InteriorFace(const FaceLoopInput& in, HdSolver& s, double* face_flux, double* face_flux_len, int i,
+inline void InteriorFace(const FaceLoopInput& in, HdSolver& s, double* face_flux_len, int i,
                          double theta = 1.0) {
   const int f = s.interior_faces[i];
   SideValues l, r;
   bool first;
-  if (!WetFaceValues<kSecond>(in, s, face_flux, face_flux_len, f, l, r, first)) return;
-  InteriorFaceTerms<kSecond>(in, s, face_flux, face_flux_len, f, i, l, r, first, theta);
+  if (!WetFaceValues<kSecond>(in, s, face_flux_len, f, l, r, first)) return;
+  InteriorFaceTerms<kSecond>(in, s, face_flux_len, f, i, l, r, first, theta);
 }
 
 // Interior faces whose two sides are wet and at least h_move deep at the face
@@ -422,12 +421,12 @@ struct WetFaceBatch {
   int n = 0;
   int face[kFaceBatch];      // mesh face
   int position[kFaceBatch];  // position in interior_faces
-  // Face values per side (l, r): depth, face d, P, Q, depth correction and
-  // the centre eta of the bed-slope term; the eddy flux (zero without eddy
-  // viscosity).
+  // Face values per side (l, r): depth, face d, P, Q, depth correction (zero
+  // without one) and the centre eta of the bed-slope term; the eddy flux
+  // (zero without eddy viscosity).
   double hl[kFaceBatch], hr[kFaceBatch], dl[kFaceBatch], dr[kFaceBatch];
   double Pl[kFaceBatch], Pr[kFaceBatch], Ql[kFaceBatch], Qr[kFaceBatch];
-  double kl[kFaceBatch], kr[kFaceBatch], etal[kFaceBatch], etar[kFaceBatch];
+  double kl[kFaceBatch] = {}, kr[kFaceBatch] = {}, etal[kFaceBatch], etar[kFaceBatch];
   double Dx[kFaceBatch] = {}, Dy[kFaceBatch] = {};
   // The face geometry, gathered only when the batch holds part of its chunk
   // (a batch of the whole chunk reads the solver's arrays in place).
@@ -435,8 +434,8 @@ struct WetFaceBatch {
   // Second order: the velocity bound of the face from the centre velocities
   // of its sides.
   double umax[kFaceBatch], vmax[kFaceBatch];
-  // Results: flux per unit length and times the length, momentum of each side.
-  double Fh[kFaceBatch], mass[kFaceBatch];
+  // Results: mass flux times the face length, momentum terms of each side.
+  double mass[kFaceBatch];
   double mx1[kFaceBatch], my1[kFaceBatch], mx2[kFaceBatch], my2[kFaceBatch];
 };
 
@@ -453,7 +452,8 @@ inline int AddBatchFace(const FaceLoopInput& in, WetFaceBatch& b, int f, int pos
   const int i = b.n++;
   b.face[i] = f;
   b.position[i] = position;
-  b.kl[i] = in.k[L], b.kr[i] = in.k[R], b.etal[i] = in.eta[L], b.etar[i] = in.eta[R];
+  if (in.k) b.kl[i] = in.k[L], b.kr[i] = in.k[R];
+  b.etal[i] = in.eta[L], b.etar[i] = in.eta[R];
   if (in.eddy) BatchEddyFlux(in, b, i, position, L, R);
   return i;
 }
@@ -505,7 +505,6 @@ template <int kSolver, bool kSecond>
     const double fx = F.momx - b.Dx[i], fy = F.momy - b.Dy[i];
     const double bd = g * F.d * (nn * glen[i]);
     const double bL = (b.etal[i] + b.kl[i]) * bd, bR = (b.etar[i] + b.kr[i]) * bd;
-    b.Fh[i] = F.Fh;
     b.mass[i] = F.mass;
     b.mx1[i] = -fx + bL * ex;
     b.my1[i] = -fy + bL * ey;
@@ -620,7 +619,7 @@ void ReconstructFaces(const FaceLoopInput& in, ReconstructionBatch& rb, WetFaceB
 // Interior faces first .. last of the face list, in batches. Every face that
 // is not batched takes InteriorFaceTerms.
 template <bool kSecond>
-void InteriorFaceChunk(const FaceLoopInput& in, HdSolver& s, double* face_flux, double* face_flux_len,
+void InteriorFaceChunk(const FaceLoopInput& in, HdSolver& s, double* face_flux_len,
                        const int* faces, int first_index, int last_index, WetFaceBatch& b, ReconstructionBatch& rb) {
   b.n = 0;
   for (int i = first_index; i <= last_index; ++i) {
@@ -636,13 +635,13 @@ void InteriorFaceChunk(const FaceLoopInput& in, HdSolver& s, double* face_flux, 
     }
     SideValues l, r;
     bool first;
-    if (!WetFaceValues<kSecond>(in, s, face_flux, face_flux_len, f, l, r, first)) continue;
+    if (!WetFaceValues<kSecond>(in, s, face_flux_len, f, l, r, first)) continue;
     // First order: plain wet faces into the batch with their face values.
     const bool plain = in.code[L] == kWet && in.code[R] == kWet && PlainFaceDepths(in, l.h, r.h);
     if (!kSecond && s.vector_faces && plain) {
       AddWetFace(in, b, f, i, L, R, l, r);
     } else {
-      InteriorFaceTerms<kSecond>(in, s, face_flux, face_flux_len, f, i, l, r, first, 1.0);
+      InteriorFaceTerms<kSecond>(in, s, face_flux_len, f, i, l, r, first, 1.0);
     }
   }
   if constexpr (kSecond) {
@@ -656,7 +655,7 @@ void InteriorFaceChunk(const FaceLoopInput& in, HdSolver& s, double* face_flux, 
       } else {
         const SideValues l{rb.eta_l[k], b.Pl[k], b.Ql[k], b.dl[k], b.hl[k]};
         const SideValues r{rb.eta_r[k], b.Pr[k], b.Qr[k], b.dr[k], b.hr[k]};
-        InteriorFaceTerms<true>(in, s, face_flux, face_flux_len, b.face[k], b.position[k], l, r, false, 1.0);
+        InteriorFaceTerms<true>(in, s, face_flux_len, b.face[k], b.position[k], l, r, false, 1.0);
       }
     }
     b.n = w;
@@ -665,7 +664,6 @@ void InteriorFaceChunk(const FaceLoopInput& in, HdSolver& s, double* face_flux, 
   for (int i = 0; i < b.n; ++i) {
     const int f = b.face[i];
     SetFaceTerms(s, f, b.mx1[i], b.my1[i], b.mx2[i], b.my2[i]);
-    face_flux[f] = b.Fh[i];
     face_flux_len[f] = b.mass[i];
   }
 }
@@ -687,7 +685,7 @@ FaceLoopInput GatherInput(const HdModule& hd, const HdSolver& s, const Mesh& mes
   in.P = st.P.data();
   in.Q = st.Q.data();
   in.code = st.wetdry.data();
-  in.k = s.depth_correction.data();
+  in.k = s.depth_correction.empty() ? nullptr : s.depth_correction.data();
   in.face_d = st.face_d.data();
   in.second = sol.scheme_of_space_discretization_horizontal == 2;
   in.xf = mesh.faces.xf.data();
@@ -728,7 +726,6 @@ FaceLoopInput GatherInput(const HdModule& hd, const HdSolver& s, const Mesh& mes
 // slots, so only the boundary loop ends with a barrier.
 void FaceTerms(HdModule& hd, HdSolver& s, const Mesh& mesh, const FaceLoopInput& in) {
   HdState& st = hd.state;
-  double* face_flux = st.face_flux.data();
   double* face_flux_len = st.face_flux_len.data();
 
   const int ni = s.interior_faces.size();
@@ -740,9 +737,9 @@ void FaceTerms(HdModule& hd, HdSolver& s, const Mesh& mesh, const FaceLoopInput&
   for (int c = 0; c < nchunks; ++c) {
     const int first = 1 + c * kFaceBatch, last = std::min(ni, (c + 1) * kFaceBatch);
     if (in.second) {
-      InteriorFaceChunk<true>(in, s, face_flux, face_flux_len, faces, first, last, batch, reconstruction);
+      InteriorFaceChunk<true>(in, s, face_flux_len, faces, first, last, batch, reconstruction);
     } else {
-      InteriorFaceChunk<false>(in, s, face_flux, face_flux_len, faces, first, last, batch, reconstruction);
+      InteriorFaceChunk<false>(in, s, face_flux_len, faces, first, last, batch, reconstruction);
     }
   }
 
@@ -754,7 +751,7 @@ void FaceTerms(HdModule& hd, HdSolver& s, const Mesh& mesh, const FaceLoopInput&
       BoundaryFaceFluxHD(hd, s, mesh, rec);
       continue;
     }
-    st.face_flux[rec.face] = st.face_flux_len[rec.face] = 0.0;
+    st.face_flux_len[rec.face] = 0.0;
     if (st.wetdry[rec.element] == kWet) {
       LandFaceTerms(in, s, rec);
     } else {
@@ -816,7 +813,7 @@ int ElementSumsHD(HdModule& hd, HdSolver& s, const Mesh& mesh, int ne, bool firs
   const double* mass = st.face_flux_len.data();
   const double* area = mesh.elements.area.data();
   const double* hbase = first_stage ? st.h.data() : st.h_old.data();
-  const double* src_h = s.src_h.data();
+  const double* src_h = s.src_h.empty() ? nullptr : s.src_h.data();
   double *sum_h = s.sum_h.data(), *sum_P = s.sum_P.data(), *sum_Q = s.sum_Q.data();
   double* factor = s.outflow_factor.data();
   int nlimited = 0;
@@ -827,7 +824,7 @@ int ElementSumsHD(HdModule& hd, HdSolver& s, const Mesh& mesh, int ne, bool firs
       ElementSums<planes>(s, mass, e, sh, sP, sQ, out);
       sum_h[e] = sh, sum_P[e] = sP, sum_Q[e] = sQ;
       if (dt > 0) {
-        const double held = std::max(0.0, hbase[e] + dt * src_h[e]) * area[e];
+        const double held = std::max(0.0, hbase[e] + (src_h ? dt * src_h[e] : 0.0)) * area[e];
         const bool limited = dt * out > held;
         factor[e] = limited ? held / (dt * out) : 1.0;
         nlimited += limited ? 1 : 0;
@@ -841,7 +838,6 @@ int ElementSumsHD(HdModule& hd, HdSolver& s, const Mesh& mesh, int ne, bool firs
 // the same state, so with the same bits) with the flux scaled.
 void LimitOutflowHD(HdModule& hd, HdSolver& s, const Mesh& mesh, const FaceLoopInput& in) {
   HdState& st = hd.state;
-  double* face_flux = st.face_flux.data();
   double* face_flux_len = st.face_flux_len.data();
   const double* factor = s.outflow_factor.data();
   const int ni = s.interior_faces.size(), nb = s.boundary_faces.size();
@@ -854,9 +850,9 @@ void LimitOutflowHD(HdModule& hd, HdSolver& s, const Mesh& mesh, const FaceLoopI
       const double theta = factor[m > 0 ? in.e1[f] : in.e2[f]];
       if (theta >= 1.0) continue;
       if (in.second) {
-        InteriorFace<true>(in, s, face_flux, face_flux_len, i, theta);
+        InteriorFace<true>(in, s, face_flux_len, i, theta);
       } else {
-        InteriorFace<false>(in, s, face_flux, face_flux_len, i, theta);
+        InteriorFace<false>(in, s, face_flux_len, i, theta);
       }
     }
     VHD_OMP_FOR_NOWAIT
@@ -878,7 +874,8 @@ void LimitOutflowHD(HdModule& hd, HdSolver& s, const Mesh& mesh, const FaceLoopI
 // base state is the current one (kept in h_old, P_old, Q_old unless kLast);
 // else it is h_old, P_old, Q_old. The depth is cut at 0 after every stage but
 // the last. kIterate: the drag is formed a second time (discretisation 2).
-template <bool kFirst, bool kLast, bool kIterate>
+// kSources: the element source terms are allocated (else they are zero).
+template <bool kFirst, bool kLast, bool kIterate, bool kSources>
 void UpdateElementsHD(HdModule& hd, const HdSolver& s, const Mesh& mesh, int ne, double dt) {
   HdState& st = hd.state;
   const double* area = mesh.elements.area.data();
@@ -911,7 +908,7 @@ void UpdateElementsHD(HdModule& hd, const HdSolver& s, const Mesh& mesh, int ne,
     } else {
       hb = h_old[e], Pb = P_old[e], Qb = Q_old[e];
     }
-    double hn = hb + dt * (dhdt + src_h[e]);
+    double hn = hb + dt * (dhdt + (kSources ? src_h[e] : 0.0));
 
     // Wet: damped explicit update, then the semi-implicit drag r = cf |u| / h
     // with the velocity of the stage state over the new depth and (on
@@ -919,8 +916,8 @@ void UpdateElementsHD(HdModule& hd, const HdSolver& s, const Mesh& mesh, int ne,
     const double damp =
         hn >= damped_below ? 1.0 : hn > h_min ? QuarterWaveSine((hn - h_min) * half_pi / h_min) : 0.0;
     const double dts = dt * damp;
-    const double Ps = Pb + dts * (dPdt + src_P[e]);
-    const double Qs = Qb + dts * (dQdt + src_Q[e]);
+    const double Ps = Pb + dts * (dPdt + (kSources ? src_P[e] : 0.0));
+    const double Qs = Qb + dts * (dQdt + (kSources ? src_Q[e] : 0.0));
     const double cf = cf_bed[e] + cf_surface[e];
     const double ih = 1.0 / hn;
     double u = Pe * ih, v = Qe * ih;
@@ -1040,7 +1037,6 @@ void SetupSolverHD(HdModule& hd, const Mesh& mesh, HdSolver& s) {
   }
   for (BoundaryFaceRecord& rec : s.boundary_faces) unit_normal(rec.face, rec.ex, rec.ey, rec.nn);
 
-  for (Array1<double>* a : {&s.src_h, &s.src_P, &s.src_Q, &s.depth_correction}) a->assign(ne, 0.0);
   s.outflow_factor.assign(ne, 1.0);
   for (Array1<double>* a : {&s.sum_h, &s.sum_P, &s.sum_Q}) a->assign(ne, 0.0);
   if (second) {
@@ -1097,11 +1093,18 @@ void CALCDERIVATIVESW2D(HdModule& hd, HdSolver& s, const Mesh& mesh, int stage, 
     LimitOutflowHD(hd, s, mesh, in);
     ElementSumsHD(hd, s, mesh, ne, first_stage, 0.0);
   }
+  auto with_sources = [&](auto first, auto last, auto iterate) {
+    if (s.src_h.empty()) {
+      UpdateElementsHD<first, last, iterate, false>(hd, s, mesh, ne, dt);
+    } else {
+      UpdateElementsHD<first, last, iterate, true>(hd, s, mesh, ne, dt);
+    }
+  };
   auto update = [&](auto first, auto last) {
     if (hd.solution.bed_resistance_discretization == 2) {
-      UpdateElementsHD<first, last, true>(hd, s, mesh, ne, dt);
+      with_sources(first, last, std::true_type{});
     } else {
-      UpdateElementsHD<first, last, false>(hd, s, mesh, ne, dt);
+      with_sources(first, last, std::false_type{});
     }
   };
   if (!first_stage) {

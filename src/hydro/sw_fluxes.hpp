@@ -14,14 +14,15 @@
 //
 // Inputs: HdState (eta, d, h, P, Q, wet/dry codes, cf, nu_t, velocity
 // gradients), the mesh geometry, the settings of HdSolutionTechnique and
-// h_min = mass_depth of HdFloodDry. Outputs: the face mass fluxes face_flux (m2/s) and face_flux_len (m3/s) of HdState
-// (positive from element1 to element2) and the new h, eta, P, Q.
+// h_min = mass_depth of HdFloodDry. Outputs: the face mass fluxes
+// face_flux_len (m3/s) of HdState (positive from element1 to element2) and
+// the new h, eta, P, Q.
 //
-// Threads. The face loop writes each face's contributions into two slots,
-// one per side, each element having one slot per local face; the element
-// loop then sums each element's slots in its local face order. No two threads
-// ever add to one element, and the order of additions is fixed, so results
-// are the same to the last bit for any thread count. The face loop takes the
+// Threads. The face loop writes each face's terms by face (its mass flux and
+// the momentum terms of both sides); a pass over the elements then sums each
+// element's terms in its local face order. No two threads ever add to one
+// element, and the order of additions is fixed, so results are the same to
+// the last bit for any thread count. The face loop takes the
 // faces in chunks: faces with two wet sides deep enough ("plain wet faces")
 // have their flux evaluated side by side in vector lanes, by the same inline
 // code as the scalar path of every other face.
@@ -131,8 +132,10 @@ struct HdSolver {
   Array1<double> gradient_x, gradient_y;
   // Per element: limited gradients of eta, P, Q (second order).
   Array1<double> eta_x, eta_y, P_x, P_y, Q_x, Q_y;
-  // Element source terms of the stage, filled by forcings and sources: depth
-  // (m/s) for every element, momentum (m2/s2) for wet elements.
+  // Element source terms of the stage: depth (m/s) for every element,
+  // momentum (m2/s2) for wet elements. Allocated (one per element) and
+  // filled by the forcings and sources that act; empty while none does, and
+  // the element update then adds nothing.
   Array1<double> src_h, src_P, src_Q;
   // Per element: the factor (0..1] of its outgoing mass fluxes in the
   // current stage (outflow limiter, see CALCDERIVATIVESW2D).
@@ -140,7 +143,8 @@ struct HdSolver {
   // Per element: the sums of the face terms of the stage (the water entering
   // it, m3/s, and its momentum terms, m4/s2).
   Array1<double> sum_h, sum_P, sum_Q;
-  // Element depth correction k (m), zero in ordinary runs.
+  // Element depth correction k (m): allocated and filled by a depth
+  // correction when one is active; empty in ordinary runs, where k is 0.
   Array1<double> depth_correction;
   // Weight of the velocity filter (element area, m2), and scratch for it
   // (allocated when the filter is on).
@@ -160,6 +164,11 @@ struct HdSolver {
   // face through the scalar path, which gives the same bits (for checks).
   bool vector_faces = true;
 };
+
+// Depth correction k of element e (0 when no depth correction is active).
+inline double DepthCorrection(const HdSolver& s, int e) {
+  return s.depth_correction.empty() ? 0.0 : s.depth_correction[e];
+}
 
 // Builds the solver tables for the velocity mesh of the module; allocates
 // every work array. Called once after SetupHD.

@@ -167,7 +167,7 @@ void ReportCflViolations(std::string_view title, const Mesh& mesh, const Array1<
 void InitialStepHD(HdModule& hd, HdSolver& solver, const Mesh& mesh) {
   HdState& st = hd.state;
   CALCVELOCITYFROMFLUX(st);
-  for (int f = 1; f <= st.face_flux.size(); ++f) st.face_flux[f] = st.face_flux_len[f] = 0.0;
+  for (int f = 1; f <= st.face_flux_len.size(); ++f) st.face_flux_len[f] = 0.0;
   // Boundary values at the first time of the run (both values of each pair).
   UpdateBoundaryValuesHD(hd, mesh, hd.time_axis.TimeOfStep(hd.time_axis.first_step));
   if (hd.eddy.horizontal.type > 0) UpdateGradientsHD(hd, solver, mesh);
