@@ -82,14 +82,16 @@ inline void VelocityAtFaceDepth(SideValues& side, double df) {
   side.Q *= ratio;
 }
 
-// Depth at a reflecting wall from the outgoing Riemann invariant
-// u_n + 2 sqrt(g h) (land condition 2), else the face depth itself.
+// Pressure depth at a wall: the depth at a reflecting wall from the outgoing
+// Riemann invariant u_n + 2 sqrt(g h) (land condition 2), else the face depth
+// itself; plus the depth correction k, as on every other face (without it a
+// lake at rest with k > 0 would be pushed off the walls).
 double WallDepth(int land_condition, double un, double h, double k, double g) {
   if (land_condition == 2 && h > 0) {
     // (max(0, u_n + 2c))^2 / (4 g) written as h (1 + u_n / 2c)^2, which is h
     // itself to the last bit for water at rest.
     const double r = std::max(0.0, 1.0 + un / (2.0 * std::sqrt(g * h)));
-    return h * r * r;
+    return h * r * r + k;
   }
   return h + k;
 }
