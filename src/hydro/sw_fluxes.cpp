@@ -1096,7 +1096,7 @@ void CALCDERIVATIVESW2D(HdModule& hd, HdSolver& s, const Mesh& mesh, int stage, 
     ElementSumsHD(hd, s, mesh, ne, first_stage, 0.0);
   }
   auto with_sources = [&](auto first, auto last, auto iterate) {
-    if (s.src_h.empty()) {
+    if (s.src_h.empty() || s.src_P.empty() || s.src_Q.empty()) {
       UpdateElementsHD<first, last, iterate, false>(hd, s, mesh, ne, dt);
     } else {
       UpdateElementsHD<first, last, iterate, true>(hd, s, mesh, ne, dt);

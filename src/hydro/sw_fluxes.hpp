@@ -133,9 +133,9 @@ struct HdSolver {
   // Per element: limited gradients of eta, P, Q (second order).
   Array1<double> eta_x, eta_y, P_x, P_y, Q_x, Q_y;
   // Element source terms of the stage: depth (m/s) for every element,
-  // momentum (m2/s2) for wet elements. Allocated (one per element) and
-  // filled by the forcings and sources that act; empty while none does, and
-  // the element update then adds nothing.
+  // momentum (m2/s2) for wet elements. Allocated together (one per element)
+  // and filled by the forcings and sources that act; empty while none does,
+  // and the element update then adds nothing.
   Array1<double> src_h, src_P, src_Q;
   // Per element: the factor (0..1] of its outgoing mass fluxes in the
   // current stage (outflow limiter, see CALCDERIVATIVESW2D).
