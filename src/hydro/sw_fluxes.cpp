@@ -40,6 +40,9 @@ struct FaceLoopInput {
   double h_move;
   int solver, entropy_fix, fad, land_condition, face_value_limiter;
   bool preserve_dU, face_limit_dry;
+
+  // Depth correction of element e (0 when none is active).
+  double K(int e) const { return k ? k[e] : 0.0; }
 };
 
 inline double Clip(double value, double a, double b) {
@@ -114,7 +117,7 @@ void EddyFlux(double nu, double hf, double ux, double uy, double vx, double vy, 
 // length times the face length.
 inline void WallTerms(const FaceLoopInput& in, int e, const SideValues& side, double ox, double oy, double nn,
                       double nlen, double& mx, double& my) {
-  const double g = in.g, hs = side.h, k = in.k ? in.k[e] : 0.0;
+  const double g = in.g, hs = side.h, k = in.K(e);
   const double un = (hs >= in.h_min && hs > 0) ? (side.P * ox + side.Q * oy) * nn / hs : 0.0;
   const double hw = WallDepth(in.land_condition, un, hs, k, g);
   const double pw = 0.5 * g * (hw * hw - side.d * side.d) * nlen;
@@ -286,7 +289,7 @@ void InteriorFaceTerms(const FaceLoopInput& in, HdSolver& s, double* face_flux_l
   const double nlen = nn * in.len[i];  // length of the normal times the face length
 
   const bool riemann = RiemannFaceCase(cL, cR, etaL, in.d[L], etaR, in.d[R], kSecond);
-  const double kL = in.k ? in.k[L] : 0.0, kR = in.k ? in.k[R] : 0.0;
+  const double kL = in.K(L), kR = in.K(R);
   const double g = in.g;
   double Dx = 0.0, Dy = 0.0;
 
@@ -815,7 +818,7 @@ int ElementSumsHD(HdModule& hd, HdSolver& s, const Mesh& mesh, int ne, bool firs
   const double* mass = st.face_flux_len.data();
   const double* area = mesh.elements.area.data();
   const double* hbase = first_stage ? st.h.data() : st.h_old.data();
-  const double* src_h = s.src_h.empty() ? nullptr : s.src_h.data();
+  const double* src_h = SourcesActive(s) ? s.src_h.data() : nullptr;
   double *sum_h = s.sum_h.data(), *sum_P = s.sum_P.data(), *sum_Q = s.sum_Q.data();
   double* factor = s.outflow_factor.data();
   int nlimited = 0;
@@ -1096,7 +1099,7 @@ void CALCDERIVATIVESW2D(HdModule& hd, HdSolver& s, const Mesh& mesh, int stage, 
     ElementSumsHD(hd, s, mesh, ne, first_stage, 0.0);
   }
   auto with_sources = [&](auto first, auto last, auto iterate) {
-    if (s.src_h.empty() || s.src_P.empty() || s.src_Q.empty()) {
+    if (!SourcesActive(s)) {
       UpdateElementsHD<first, last, iterate, false>(hd, s, mesh, ne, dt);
     } else {
       UpdateElementsHD<first, last, iterate, true>(hd, s, mesh, ne, dt);

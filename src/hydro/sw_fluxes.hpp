@@ -165,6 +165,11 @@ struct HdSolver {
   bool vector_faces = true;
 };
 
+// Whether element source terms act in the stage (all three allocated).
+inline bool SourcesActive(const HdSolver& s) {
+  return !s.src_h.empty() && !s.src_P.empty() && !s.src_Q.empty();
+}
+
 // Depth correction k of element e (0 when no depth correction is active).
 inline double DepthCorrection(const HdSolver& s, int e) {
   return s.depth_correction.empty() ? 0.0 : s.depth_correction[e];
