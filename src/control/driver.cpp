@@ -47,9 +47,8 @@ void WriteCompletion(int run_status) {
 void RefuseSeveralProcesses(const RunControl& run) {
   if (run.nprocesses <= 1) return;
   FatalError("RunVantorHD: Runs on several processes (" + std::to_string(run.nprocesses) +
-             ") are not available in this build: the mesh is not partitioned, so every process "
-             "would compute the whole mesh and sums over processes would be multiplied. Run on "
-             "one process and use threads (OMP_NUM_THREADS) instead");
+             ") are not available in this build (the mesh is not split over the processes): "
+             "run on one process, with threads (OMP_NUM_THREADS)");
 }
 
 }  // namespace

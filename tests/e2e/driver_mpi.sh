@@ -18,7 +18,7 @@ status=$?
 [ $status -ne 0 ] || fail "two processes gave exit status 0"
 [ $status -ne 124 ] || fail "two processes hung"
 contains "$d/setup.log" "Number of processes  : 2"
-contains "$d/setup.log" "Runs on several processes (2) are not available"
+contains "$d/setup.log" "Fatal error: RunVantorHD: Runs on several processes (2) are"
 lacks "$d/setup.log" "Normal run completion"
 
 finish
