@@ -251,8 +251,7 @@ void BoundaryFaceFluxHD(HdModule& hd, HdSolver& s, const Mesh& mesh, const Bound
       }
       break;
     }
-    case kBcTransmissive:
-      break;
+    case kBcTransmissive:  // the incoming characteristic of the start of the run
     case kBcLevelWeak: {
       const double Rminus = OldValue(fc, 2);
       const double Rplus = un + 2.0 * cel;
