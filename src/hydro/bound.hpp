@@ -15,8 +15,9 @@
 //    6     surface level, m                          level
 //    7     discharge, m3/s; per face the discharge   q (m2/s, positive into
 //          per unit width after distribution          the domain)
-//    9     transmissive (outer state = inner state)  the data value (unused
-//                                                    by the flux)
+//    9     transmissive (outgoing characteristics    the data value (unused
+//          from inside, the incoming one of the      by the flux), incoming
+//          inner state at the start of the run)      characteristic R- (m/s)
 //   10     level, weakly reflecting                  level, incoming
 //                                                    characteristic R- (m/s)
 //   11     velocity, weakly reflecting               u, v
@@ -39,7 +40,21 @@
 //   - type_secondary: level (6) 2 = no tangential inflow velocity; discharge
 //     (7) 3 = tangential flux from inside also on inflow; other values as 1;
 //   - the data value of a transmissive boundary (9) is read (transport reuses
-//     the codes) but does not enter the flux;
+//     the codes) but does not enter the flux. The outer state is not the
+//     inner state itself: that condition leaves the incoming characteristic
+//     to the boundary element, which on triangles drifts with the flow across
+//     the element's inner faces (a simple wave came back at 37 %, and grew
+//     without bound at second order). The face keeps the incoming
+//     characteristic u_n - 2 sqrt(g h) of its inner element at the first
+//     update and forms the outer state as the weakly reflecting level (10)
+//     does: waves leave, the state of the start is the water outside;
+//   - discharge (7): the outer depth joins the discharge with the outgoing
+//     characteristic u_n + 2c of the inner element (the cubic of approach
+//     2), so that the Riemann solver of approaches 1 and 3 sees one wave
+//     running into the domain and passes the discharge; where the inner
+//     element has no velocity (not wet, or below h_min) every approach
+//     writes the flux of that outer state directly (the Riemann solver
+//     against a side at rest passed half the discharge onto a dry bed);
 //   - the discharge weights use the local conveyance factor 1/sqrt(K) with K
 //     the element's bed-resistance coefficient (cf = K h^(-1/3) for Manning
 //     types), 1 without bed resistance; the face value q_j = Q w_j / sum(w L)

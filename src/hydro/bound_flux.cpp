@@ -227,23 +227,31 @@ void BoundaryFaceFluxHD(HdModule& hd, HdSolver& s, const Mesh& mesh, const Bound
       break;
     }
     case kBcDischarge: {
+      // The outer depth joins the discharge with the outgoing characteristic
+      // of the inner element. Approach 2, and any approach whose inner
+      // element has no velocity (not wet, or below h_min: the Riemann solver
+      // would see a side at rest and pass about half the discharge), write
+      // the flux of that state directly; approaches 1 and 3 otherwise pass it
+      // to the Riemann solver, which then has a single wave running into the
+      // domain and passes the outer flux.
       const double q = OldValue(fc, 1);  // per unit width, into the domain
-      if (fc.approach == 2) {
-        const double cb = DischargeCelerity(q, un + 2.0 * cel, g);
-        const double hb = cb * cb / g;
-        const double unb = hb > 0.0 ? -q / hb : 0.0;
+      const double cb = DischargeCelerity(q, un + 2.0 * cel, g);
+      const double hb = cb * cb / g;
+      const double unb = hb > 0.0 ? -q / hb : 0.0;
+      if (fc.approach == 2 || !wet || h < h_min) {
         const double utb = (unb > 0.0 || fc.type_secondary == 3) ? ut : 0.0;
         F = DirectFlux(hb, unb, utb, d, k, nx, ny, len, g);
         riemann = false;
       } else {
         const double qbn = -q;
         const double qbt = (qbn > 0.0 || fc.type_secondary == 3) ? qt_in : 0.0;
+        out.h = hb;
+        out.hp = hb + k;
         SetFlux(out, qbn, qbt, nx, ny, h_min);
       }
       break;
     }
-    case kBcTransmissive:
-      break;
+    case kBcTransmissive:  // the incoming characteristic of the start of the run
     case kBcLevelWeak: {
       const double Rminus = OldValue(fc, 2);
       const double Rplus = un + 2.0 * cel;

@@ -62,6 +62,20 @@ double IncomingCharacteristic(double level, double d, double g) {
   return 2.0 * std::sqrt(g * std::max(0.0, d)) - 4.0 * std::sqrt(g * hl);
 }
 
+// Incoming characteristic u_n - 2 sqrt(g h) of the inner element of a face
+// (u_n outward; velocity 0 where the element is not wet or below h_min), at
+// the depth over the face's still water depth.
+double InnerIncomingCharacteristic(const HdModule& hd, const Mesh& mesh, const BoundaryFaceCondition& fc) {
+  const HdState& st = hd.state;
+  const int c = fc.element;
+  const double h = std::max(0.0, st.eta[c] + StillDepth(st, fc));
+  double un = 0.0;
+  if (st.wetdry[c] == kWet && st.h[c] >= hd.flood_dry.mass_depth && st.h[c] > 0) {
+    un = (st.P[c] * mesh.faces.nx[fc.face] + st.Q[c] * mesh.faces.ny[fc.face]) / st.h[c];
+  }
+  return un - 2.0 * std::sqrt(kPhysical.g * h);
+}
+
 }  // namespace
 
 void UpdateBoundaryValuesHD(HdModule& hd, const Mesh& mesh, double t) {
@@ -87,6 +101,12 @@ void UpdateBoundaryValuesHD(HdModule& hd, const Mesh& mesh, double t) {
     TiltLevelHD(hd, mesh, b);
     ConstrainFlatherHD(hd, mesh, b);
     CorrectRadiationStressHD(hd, mesh, b);
+    if (b.type == kBcTransmissive && !bc.filled) {
+      for (int j = 1; j <= b.nfaces; ++j) {
+        BoundaryFaceCondition& fc = bc.faces[b.first_face + j - 1];
+        OldValue(fc, 2) = NewValue(fc, 2) = InnerIncomingCharacteristic(hd, mesh, fc);
+      }
+    }
     if (b.type == kBcLevelWeak) {
       for (int j = 1; j <= b.nfaces; ++j) {
         BoundaryFaceCondition& fc = bc.faces[b.first_face + j - 1];

@@ -13,8 +13,6 @@
 #include <vector>
 
 #include "bound_support.hpp"
-#include "io/units.hpp"
-#include "io/zrn.hpp"
 
 namespace vhd {
 namespace {
@@ -23,6 +21,7 @@ using test::BoundCase;
 using test::Channel;
 using test::CodeSection;
 using test::Flat;
+using test::WriteSeries;
 
 constexpr double kG = 9.81;
 
@@ -34,22 +33,6 @@ int NearestElement(const Mesh& m, double x, double y) {
     if (d < dmin) dmin = d, best = e;
   }
   return best;
-}
-
-// A point series of one item at the start of the time axis, every dt seconds.
-void WriteSeries(const std::string& name, const TimeAxis& time, double dt, int nsteps,
-                 const std::function<double(double)>& value) {
-  ZrnFile f;
-  ASSERT_EQ(zrnHeaderCreate(f, name, kZrnFileData, "boundary series"), 0);
-  ASSERT_EQ(zrnSetEqCalendarAxis(f, zrnDateTime(time.start), dt), 0);
-  ASSERT_EQ(zrnSetItemInfo(f, 1, "Level", kUvqItemUndefined, kUvqUnitUndefined, kZrnDouble), 0);
-  ASSERT_EQ(zrnSetItemAxisEqD0(f, 1), 0);
-  ASSERT_EQ(zrnFileCreate(f), 0);
-  for (int s = 0; s < nsteps; ++s) {
-    const double v = value(s * dt);
-    ASSERT_EQ(zrnWriteItemTimeStep(f, 0.0, &v, 1), 0);
-  }
-  ASSERT_EQ(zrnFileClose(f), 0);
 }
 
 // ---- tide through a level boundary --------------------------------------------------------

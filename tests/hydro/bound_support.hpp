@@ -8,6 +8,8 @@
 #include <string>
 
 #include "hydro/bound.hpp"
+#include "io/units.hpp"
+#include "io/zrn.hpp"
 #include "io/setup.hpp"
 #include "log/log.hpp"
 #include "setup_support.hpp"
@@ -78,6 +80,22 @@ struct BoundCase {
   std::string log_path = dir.file("model.log");
   SwCase c;
 };
+
+// A point series of one item at the start of the time axis, every dt seconds.
+inline void WriteSeries(const std::string& name, const TimeAxis& time, double dt, int nsteps,
+                 const std::function<double(double)>& value) {
+  ZrnFile f;
+  ASSERT_EQ(zrnHeaderCreate(f, name, kZrnFileData, "boundary series"), 0);
+  ASSERT_EQ(zrnSetEqCalendarAxis(f, zrnDateTime(time.start), dt), 0);
+  ASSERT_EQ(zrnSetItemInfo(f, 1, "Level", kUvqItemUndefined, kUvqUnitUndefined, kZrnDouble), 0);
+  ASSERT_EQ(zrnSetItemAxisEqD0(f, 1), 0);
+  ASSERT_EQ(zrnFileCreate(f), 0);
+  for (int s = 0; s < nsteps; ++s) {
+    const double v = value(s * dt);
+    ASSERT_EQ(zrnWriteItemTimeStep(f, 0.0, &v, 1), 0);
+  }
+  ASSERT_EQ(zrnFileClose(f), 0);
+}
 
 // A straight channel along x: nx x ny cells of dx x dy, bed z(x, y), codes of
 // the four sides.
