@@ -7,6 +7,7 @@
 #include <cmath>
 #include <vector>
 
+#include "bound_support.hpp"
 #include "mesh/cartography.hpp"
 #include "sw_case.hpp"
 
@@ -148,6 +149,28 @@ TEST(SwGeographic, LakeAtRestStaysAtRest) {
         }
       }
     }
+  }
+}
+
+// Level boundaries at the lake's level hold a lake at rest on the sphere at
+// rest too: their faces are part of each element's unbalanced pressure sum.
+TEST(SwGeographic, OpenBoundariesHoldALakeAtRest) {
+  const double level = 1.3;
+  for (int order : {1, 2}) {
+    SCOPED_TRACE(testing::Message() << "order " << order);
+    BoundCase b;
+    RectangleMeshSpec spec = GeoSpec(10.0, 12.0, 59.0, 61.0, 12, 12, CellLayout::kRandomTriangles,
+                                     [](double lon, double) { return -10.0 - 2.0 * (lon - 10.0); });
+    spec.code_west = 2, spec.code_east = 3;
+    const std::string level_boundary = "type = 6\ntype_of_soft_start = 0\nconstant_value = " + std::to_string(level) + "\n";
+    b.Make(spec, 100.0, 400, CodeSection(2, level_boundary) + CodeSection(3, level_boundary));
+    SetScheme(b.c.hd, 1, order);
+    b.Start([level](double, double) { return level; });
+    RunTo(b.c, 400 * 100.0);
+    double umax = 0.0;
+    for (int e = 1; e <= b.c.hd.state.nelements; ++e)
+      umax = std::max({umax, std::abs(b.c.hd.state.u[e]), std::abs(b.c.hd.state.v[e])});
+    EXPECT_LT(umax, 1e-10);
   }
 }
 
