@@ -7,6 +7,7 @@
 #include <numbers>
 #include <string>
 #include <type_traits>
+#include <vector>
 
 #include "core/omp.hpp"
 #include "hydro/reconstruction.hpp"
@@ -693,9 +694,9 @@ FaceLoopInput GatherInput(const HdModule& hd, const HdSolver& s, const Mesh& mes
   in.k = s.depth_correction.empty() ? nullptr : s.depth_correction.data();
   in.face_d = st.face_d.data();
   in.second = sol.scheme_of_space_discretization_horizontal == 2;
-  in.xf = mesh.faces.xf.data();
+  in.xf = s.continuous_xf.empty() ? mesh.faces.xf.data() : s.continuous_xf.data();
   in.yf = mesh.faces.yf.data();
-  in.xc = mesh.elements.xc.data();
+  in.xc = s.continuous_xc.empty() ? mesh.elements.xc.data() : s.continuous_xc.data();
   in.yc = mesh.elements.yc.data();
   in.face_start = mesh.elements.face_start.data();
   in.face_list = mesh.elements.face_list.data();
@@ -978,6 +979,43 @@ void SetupSphereHD(const Mesh& mesh, HdSolver& s) {
   }
 }
 
+// Longitudes of the centroids and face centres taken into [cut, cut + 2 pi)
+// with the cut in the widest gap between the node longitudes, when that gap
+// is wider than every element (so no element crosses it); stored only when
+// that moves a longitude, i.e. when the mesh crosses the 180-degree meridian.
+void ContinuousLongitudesHD(const Mesh& mesh, HdSolver& s) {
+  constexpr double two_pi = 2.0 * std::numbers::pi;
+  auto wrap = [](double x) { return std::remainder(x, two_pi); };  // [-pi, pi]
+  const NodeTable& nd = mesh.nodes;
+  const ElementTable& E = mesh.elements;
+  std::vector<double> lon(nd.nnodes);
+  for (int n = 1; n <= nd.nnodes; ++n) lon[n - 1] = wrap(nd.x[n]);
+  std::sort(lon.begin(), lon.end());
+  double gap = lon.front() + two_pi - lon.back(), cut = lon.back() + 0.5 * gap;
+  for (std::size_t i = 1; i < lon.size(); ++i) {
+    if (lon[i] - lon[i - 1] > gap) gap = lon[i] - lon[i - 1], cut = lon[i - 1] + 0.5 * gap;
+  }
+  double widest = 0.0;
+  for (int e = 1; e <= E.nelements; ++e) {
+    const double x0 = nd.x[ElementNode(E, e, 1)];
+    double lo = 0.0, hi = 0.0;
+    for (int j = 2; j <= ElementNodeCount(E, e); ++j) {
+      const double dx = wrap(nd.x[ElementNode(E, e, j)] - x0);
+      lo = std::min(lo, dx), hi = std::max(hi, dx);
+    }
+    widest = std::max(widest, hi - lo);
+  }
+  if (gap <= widest) return;
+  auto shifted = [&](double x) { return x - two_pi * std::floor((x - cut) / two_pi); };
+  bool moved = false;
+  for (int e = 1; e <= E.nelements && !moved; ++e) moved = shifted(E.xc[e]) != E.xc[e];
+  if (!moved) return;
+  s.continuous_xc.assign(E.nelements);
+  s.continuous_xf.assign(mesh.faces.nfaces);
+  for (int e = 1; e <= E.nelements; ++e) s.continuous_xc[e] = shifted(E.xc[e]);
+  for (int f = 1; f <= mesh.faces.nfaces; ++f) s.continuous_xf[f] = shifted(mesh.faces.xf[f]);
+}
+
 // Terms of the sphere, added to the element sums of the stage for the wet
 // elements (geographic meshes):
 //  - the part of the pressure that the faces of an element leave over: for
@@ -1085,7 +1123,10 @@ void SetupSolverHD(HdModule& hd, const Mesh& mesh, HdSolver& s) {
     }
   }
   const bool geographic = IsGeographic(mesh.projection);
-  if (geographic) SetupSphereHD(mesh, s);
+  if (geographic) {
+    SetupSphereHD(mesh, s);
+    ContinuousLongitudesHD(mesh, s);
+  }
   auto unit_normal = [&](int f, double& ex, double& ey, double& nn) {
     if (geographic) {
       double len;

@@ -120,6 +120,11 @@ struct HdSolver {
   // faces nearer the pole are shorter); the element update balances the face
   // pressures with it (SphereTermsHD in sw_fluxes.cpp).
   Array1<double> metric_area, metric_face_length, metric_closure_x, metric_closure_y;
+  // Geographic mesh across the 180-degree meridian: the longitudes of the
+  // centroids and face centres made continuous over the mesh, for the
+  // offsets of the face reconstruction (empty otherwise, and for a mesh
+  // around the whole globe).
+  Array1<double> continuous_xc, continuous_xf;
 
   // Momentum terms of the current stage, four per face f at 4f .. 4f + 3:
   // x and y of the element1 side, then of the element2 side (m4/s2; zero on
