@@ -136,7 +136,8 @@ void CyclicFace(HdModule& hd, HdSolver& s, const Mesh& mesh, const BoundaryFaceR
     return;
   }
   const double g = kPhysical.g, h_min = hd.flood_dry.mass_depth;
-  const double nx = mesh.faces.nx[f], ny = mesh.faces.ny[f], len = mesh.faces.length[f];
+  double nx, ny, len;
+  FaceMetres(mesh, f, nx, ny, len);
   const double dm = 0.5 * (st.d[c] + st.d[p]);
   double dc, hc, dp, hp;
   FaceDepth(st.eta[c], dm, dc, hc);
@@ -188,7 +189,8 @@ void BoundaryFaceFluxHD(HdModule& hd, HdSolver& s, const Mesh& mesh, const Bound
   }
   const HdSolutionTechnique& sol = hd.solution;
   const double g = kPhysical.g, h_min = hd.flood_dry.mass_depth;
-  const double nx = mesh.faces.nx[f], ny = mesh.faces.ny[f], len = mesh.faces.length[f];
+  double nx, ny, len;
+  FaceMetres(mesh, f, nx, ny, len);
   const double df = st.face_d[f];
   const double k = DepthCorrection(s, c);
 

@@ -259,7 +259,7 @@ void PairCyclic(const Mesh& mesh, HdBoundary& bc) {
     for (int k = 1; k <= n; ++k) {
       BoundaryFaceCondition& fc = bc.faces[b.first_face + k - 1];
       const BoundaryFaceCondition& pc = bc.faces[o.first_face + n - k];
-      const double la = mesh.faces.length[fc.face], lb = mesh.faces.length[pc.face];
+      const double la = FaceLengthMetres(mesh, fc.face), lb = FaceLengthMetres(mesh, pc.face);
       if (std::abs(la - lb) > 1e-6 * la) {
         FatalError("SetupBoundCondHD: Length of faces must be identical (face " + std::to_string(fc.face) +
                    " of code " + std::to_string(code) + ": " + NumberText(la, 12) + " m, face " +

@@ -39,7 +39,7 @@ void IntegrateAlongBoundary(const Mesh& mesh, const HdBoundary& bc, const Bounda
                             Array1<double>& work) {
   double node = 0.0;
   for (int j = 1; j <= b.nfaces; ++j) {
-    const double rise = work[j] * mesh.faces.length[bc.faces[b.first_face + j - 1].face];
+    const double rise = work[j] * FaceLengthMetres(mesh, bc.faces[b.first_face + j - 1].face);
     work[j] = node + 0.5 * rise;
     node += rise;
   }
@@ -130,7 +130,7 @@ void DistributeDischargeHD(HdModule& hd, const Mesh& mesh, BoundaryCondition& b)
   for (int j = 1; j <= b.nfaces; ++j) {
     const BoundaryFaceCondition& fc = bc.faces[b.first_face + j - 1];
     if (!Owned(st, fc)) continue;
-    const double len = mesh.faces.length[fc.face];
+    const double len = FaceLengthMetres(mesh, fc.face);
     length += len;
     if (st.wetdry[fc.element] == kWet) {
       wet_length += len;
@@ -154,7 +154,7 @@ void DistributeDischargeHD(HdModule& hd, const Mesh& mesh, BoundaryCondition& b)
     double factor = 1.0;
     if (conveyance && hd.bed.K[fc.element] > 0.0) factor = 1.0 / std::sqrt(hd.bed.K[fc.element]);
     w[j] = std::pow(depth, 5.0 / 3.0) * factor;
-    if (Owned(st, fc)) weight_sum += w[j] * mesh.faces.length[fc.face];
+    if (Owned(st, fc)) weight_sum += w[j] * FaceLengthMetres(mesh, fc.face);
   }
   weight_sum = SumOverProcesses(weight_sum, run);
 
@@ -186,7 +186,8 @@ void TiltLevelHD(HdModule& hd, const Mesh& mesh, BoundaryCondition& b) {
     const double h = st.h[c];
     w[j] = 0.0;
     if (st.wetdry[c] != kWet || h <= 0.0) continue;
-    const double nx = mesh.faces.nx[fc.face], ny = mesh.faces.ny[fc.face];
+    double nx, ny, len;
+    FaceMetres(mesh, fc.face, nx, ny, len);
     const double tx = -ny, ty = nx;
     double force = 0.0;  // along-boundary force per unit area / rho (m2/s2)
     if (coriolis) force -= ff.coriolis[c] * (st.P[c] * nx + st.Q[c] * ny);
@@ -213,8 +214,9 @@ void ConstrainFlatherHD(HdModule& hd, const Mesh& mesh, BoundaryCondition& b) {
     if (!Owned(st, fc) || st.wetdry[fc.element] != kWet) continue;
     const double h = OldValue(fc, 1) + StillDepth(st, fc);
     if (h <= 0.0) continue;
-    const double len = mesh.faces.length[fc.face];
-    const double un = OldValue(fc, 2) * mesh.faces.nx[fc.face] + OldValue(fc, 3) * mesh.faces.ny[fc.face];
+    double nx, ny, len;
+    FaceMetres(mesh, fc.face, nx, ny, len);
+    const double un = OldValue(fc, 2) * nx + OldValue(fc, 3) * ny;
     area += h * len;
     discharge -= un * h * len;
   }
@@ -234,8 +236,10 @@ void ConstrainFlatherHD(HdModule& hd, const Mesh& mesh, BoundaryCondition& b) {
     const double shift = -(target - discharge) / area;
     for (int j = 1; j <= b.nfaces; ++j) {
       BoundaryFaceCondition& fc = bc.faces[b.first_face + j - 1];
-      OldValue(fc, 2) += shift * mesh.faces.nx[fc.face];
-      OldValue(fc, 3) += shift * mesh.faces.ny[fc.face];
+      double nx, ny, len;
+      FaceMetres(mesh, fc.face, nx, ny, len);
+      OldValue(fc, 2) += shift * nx;
+      OldValue(fc, 3) += shift * ny;
     }
   }
 }
@@ -260,7 +264,9 @@ void CorrectRadiationStressHD(HdModule& hd, const Mesh& mesh, BoundaryCondition&
     w[j] = 0.0;
     const double h = st.h[c];
     if (st.wetdry[c] != kWet || h <= 0.0) continue;
-    const double tx = -mesh.faces.ny[fc.face], ty = mesh.faces.nx[fc.face];
+    double nx, ny, len;
+    FaceMetres(mesh, fc.face, nx, ny, len);
+    const double tx = -ny, ty = nx;
     w[j] = (ff.radiation_x[c] * tx + ff.radiation_y[c] * ty) / (g * h);
   }
   IntegrateAlongBoundary(mesh, bc, b, deepest, w);

@@ -134,8 +134,8 @@ void SetupSpaceHD(HdModule& hd, const std::vector<const Mesh*>& meshes) {
 double CflLengthHD(const Mesh& mesh, int e) {
   const ElementTable& el = mesh.elements;
   double perimeter = 0.0;
-  for (int j = 1; j <= ElementFaceCount(el, e); ++j) perimeter += mesh.faces.length[ElementFace(el, e, j)];
-  return perimeter > 0.0 ? 4.0 * el.area[e] / perimeter : el.length[e];
+  for (int j = 1; j <= ElementFaceCount(el, e); ++j) perimeter += FaceLengthMetres(mesh, ElementFace(el, e, j));
+  return perimeter > 0.0 ? 4.0 * ElementAreaMetres(mesh, e) / perimeter : el.length[e];
 }
 
 void AllocateVelocityGradientsHD(HdState& s) {

@@ -50,9 +50,19 @@ void UpdateReconstructionHD(HdModule& hd, HdSolver& s, const Mesh& mesh) {
 }
 
 void UpdateGradientsHD(HdModule& hd, HdSolver& s, const Mesh& mesh) {
-  (void)mesh;
   HdState& st = hd.state;
   CALCGRADIENTVELOCITYELEMENT2D(s.gradient, st.u, st.v, st.ux, st.uy, st.vx, st.vy);
+  if (!IsGeographic(mesh.projection)) return;
+  // Per radian of longitude and latitude -> per metre east and north.
+  const double* cos_lat = mesh.elements.cos_lat.data();
+  const int ne = st.nelements;
+  for (int e = 1; e <= ne; ++e) {
+    const double east = 1.0 / (kMeshEarthRadius * cos_lat[e]), north = 1.0 / kMeshEarthRadius;
+    st.ux[e] *= east;
+    st.vx[e] *= east;
+    st.uy[e] *= north;
+    st.vy[e] *= north;
+  }
 }
 
 }  // namespace vhd

@@ -7,6 +7,7 @@
 #include <numbers>
 #include <string>
 #include <type_traits>
+#include <vector>
 
 #include "core/omp.hpp"
 #include "hydro/reconstruction.hpp"
@@ -683,7 +684,7 @@ FaceLoopInput GatherInput(const HdModule& hd, const HdSolver& s, const Mesh& mes
   in.ey = s.interior_ey.data();
   in.nn = s.interior_nn.data();
   in.len = s.interior_len.data();
-  in.face_length = mesh.faces.length.data();
+  in.face_length = s.metric_face_length.empty() ? mesh.faces.length.data() : s.metric_face_length.data();
   in.eta = st.eta.data();
   in.d = st.d.data();
   in.h = st.h.data();
@@ -693,9 +694,9 @@ FaceLoopInput GatherInput(const HdModule& hd, const HdSolver& s, const Mesh& mes
   in.k = s.depth_correction.empty() ? nullptr : s.depth_correction.data();
   in.face_d = st.face_d.data();
   in.second = sol.scheme_of_space_discretization_horizontal == 2;
-  in.xf = mesh.faces.xf.data();
+  in.xf = s.continuous_xf.empty() ? mesh.faces.xf.data() : s.continuous_xf.data();
   in.yf = mesh.faces.yf.data();
-  in.xc = mesh.elements.xc.data();
+  in.xc = s.continuous_xc.empty() ? mesh.elements.xc.data() : s.continuous_xc.data();
   in.yc = mesh.elements.yc.data();
   in.face_start = mesh.elements.face_start.data();
   in.face_list = mesh.elements.face_list.data();
@@ -816,7 +817,7 @@ void ForFacePlanes(const HdSolver& s, Fn&& fn) {
 int ElementSumsHD(HdModule& hd, HdSolver& s, const Mesh& mesh, int ne, bool first_stage, double dt) {
   const HdState& st = hd.state;
   const double* mass = st.face_flux_len.data();
-  const double* area = mesh.elements.area.data();
+  const double* area = ElementAreasHD(s, mesh);
   const double* hbase = first_stage ? st.h.data() : st.h_old.data();
   const double* src_h = SourcesActive(s) ? s.src_h.data() : nullptr;
   double *sum_h = s.sum_h.data(), *sum_P = s.sum_P.data(), *sum_Q = s.sum_Q.data();
@@ -883,7 +884,7 @@ void LimitOutflowHD(HdModule& hd, HdSolver& s, const Mesh& mesh, const FaceLoopI
 template <bool kFirst, bool kLast, bool kIterate, bool kSources>
 void UpdateElementsHD(HdModule& hd, const HdSolver& s, const Mesh& mesh, int ne, double dt) {
   HdState& st = hd.state;
-  const double* area = mesh.elements.area.data();
+  const double* area = ElementAreasHD(s, mesh);
   const int* code = st.wetdry.data();
   const double* d = st.d.data();
   const double* cf_bed = st.cf.data();
@@ -953,12 +954,104 @@ void UpdateElementsHD(HdModule& hd, const HdSolver& s, const Mesh& mesh, int ne,
   }
 }
 
+// Areas, face lengths and the closure of the face normals of every element
+// on the sphere (geographic meshes).
+void SetupSphereHD(const Mesh& mesh, HdSolver& s) {
+  const ElementTable& E = mesh.elements;
+  const FaceTable& F = mesh.faces;
+  const int ne = E.nelements, nf = F.nfaces;
+  s.metric_area.assign(ne);
+  s.metric_face_length.assign(nf);
+  s.metric_closure_x.assign(ne, 0.0);
+  s.metric_closure_y.assign(ne, 0.0);
+  for (int e = 1; e <= ne; ++e) s.metric_area[e] = ElementAreaMetres(mesh, e);
+  for (int f = 1; f <= nf; ++f) {
+    double nx, ny, len;
+    FaceMetres(mesh, f, nx, ny, len);
+    s.metric_face_length[f] = len;
+    const int a = F.element1[f], b = F.element2[f];
+    s.metric_closure_x[a] += nx * len;
+    s.metric_closure_y[a] += ny * len;
+    if (b > 0) {
+      s.metric_closure_x[b] -= nx * len;
+      s.metric_closure_y[b] -= ny * len;
+    }
+  }
+}
+
+// Longitudes of the centroids and face centres taken into [cut, cut + 2 pi)
+// with the cut in the widest gap between the node longitudes, when that gap
+// is wider than every element (so no element crosses it); stored only when
+// that moves a longitude, i.e. when the mesh crosses the 180-degree meridian.
+void ContinuousLongitudesHD(const Mesh& mesh, HdSolver& s) {
+  constexpr double two_pi = 2.0 * std::numbers::pi;
+  auto wrap = [](double x) { return std::remainder(x, two_pi); };  // [-pi, pi]
+  const NodeTable& nd = mesh.nodes;
+  const ElementTable& E = mesh.elements;
+  std::vector<double> lon(nd.nnodes);
+  for (int n = 1; n <= nd.nnodes; ++n) lon[n - 1] = wrap(nd.x[n]);
+  std::sort(lon.begin(), lon.end());
+  double gap = lon.front() + two_pi - lon.back(), cut = lon.back() + 0.5 * gap;
+  for (std::size_t i = 1; i < lon.size(); ++i) {
+    if (lon[i] - lon[i - 1] > gap) gap = lon[i] - lon[i - 1], cut = lon[i - 1] + 0.5 * gap;
+  }
+  double widest = 0.0;
+  for (int e = 1; e <= E.nelements; ++e) {
+    const double x0 = nd.x[ElementNode(E, e, 1)];
+    double lo = 0.0, hi = 0.0;
+    for (int j = 2; j <= ElementNodeCount(E, e); ++j) {
+      const double dx = wrap(nd.x[ElementNode(E, e, j)] - x0);
+      lo = std::min(lo, dx), hi = std::max(hi, dx);
+    }
+    widest = std::max(widest, hi - lo);
+  }
+  if (gap <= widest) return;
+  auto shifted = [&](double x) { return x - two_pi * std::floor((x - cut) / two_pi); };
+  bool moved = false;
+  for (int e = 1; e <= E.nelements && !moved; ++e) moved = shifted(E.xc[e]) != E.xc[e];
+  if (!moved) return;
+  s.continuous_xc.assign(E.nelements);
+  s.continuous_xf.assign(mesh.faces.nfaces);
+  for (int e = 1; e <= E.nelements; ++e) s.continuous_xc[e] = shifted(E.xc[e]);
+  for (int f = 1; f <= mesh.faces.nfaces; ++f) s.continuous_xf[f] = shifted(mesh.faces.xf[f]);
+}
+
+// Terms of the sphere, added to the element sums of the stage for the wet
+// elements (geographic meshes):
+//  - the part of the pressure that the faces of an element leave over: for
+//    a wet element every face carries g/2 (h_p^2 - d^2) with the bed-slope
+//    term g X d (X = eta + k), which sum to -g/2 X^2 times the closure C of
+//    its face normals at rest. C is zero on a plane, not on the sphere;
+//    adding g/2 X^2 C makes the face terms the discrete -g h grad(eta)
+//    again, so that water at rest stays at rest to round-off;
+//  - the curvature of the east and north directions: per unit area
+//    + P Q tan(lat) / (R h) east and - P^2 tan(lat) / (R h) north, for water
+//    at least h_min deep (below it the update carries no velocity either).
+void SphereTermsHD(const HdModule& hd, HdSolver& s, const Mesh& mesh, int ne) {
+  const HdState& st = hd.state;
+  const double* tan_lat = mesh.elements.tan_lat.data();
+  const double g = kPhysical.g, h_min = hd.flood_dry.mass_depth;
+  const double inv_radius = 1.0 / kMeshEarthRadius;
+  VHD_OMP_PARALLEL_FOR
+  for (int e = 1; e <= ne; ++e) {
+    if (st.wetdry[e] != kWet) continue;
+    const double X = st.eta[e] + DepthCorrection(s, e);
+    const double pressure = 0.5 * g * X * X;
+    double cx = 0.0, cy = 0.0;
+    const double h = st.h[e];
+    if (h >= h_min && h > 0) {
+      const double k = tan_lat[e] * inv_radius * s.metric_area[e] / h;
+      cx = k * st.P[e] * st.Q[e];
+      cy = -k * st.P[e] * st.P[e];
+    }
+    s.sum_P[e] += pressure * s.metric_closure_x[e] + cx;
+    s.sum_Q[e] += pressure * s.metric_closure_y[e] + cy;
+  }
+}
+
 }  // namespace
 
 void SetupSolverHD(HdModule& hd, const Mesh& mesh, HdSolver& s) {
-  if (IsGeographic(mesh.projection)) {
-    FatalError("SetupSolverHD: the 2D shallow-water solver does not support geographic (LONG/LAT) meshes");
-  }
   const int ne = mesh.elements.nelements;
   const int ne_owned = mesh.elements.nelements_int > 0 ? mesh.elements.nelements_int : ne;
   const int nf = mesh.faces.nfaces;
@@ -1029,7 +1122,18 @@ void SetupSolverHD(HdModule& hd, const Mesh& mesh, HdSolver& s) {
       st.face_d[f] = b > 0 ? 0.5 * (st.d[a] + st.d[b]) : st.d[a];
     }
   }
+  const bool geographic = IsGeographic(mesh.projection);
+  if (geographic) {
+    SetupSphereHD(mesh, s);
+    ContinuousLongitudesHD(mesh, s);
+  }
   auto unit_normal = [&](int f, double& ex, double& ey, double& nn) {
+    if (geographic) {
+      double len;
+      FaceMetres(mesh, f, ex, ey, len);
+      nn = 1.0;
+      return;
+    }
     nn = std::sqrt(F.nx[f] * F.nx[f] + F.ny[f] * F.ny[f]);
     ex = nn > 0 ? F.nx[f] / nn : 0.0;
     ey = nn > 0 ? F.ny[f] / nn : 0.0;
@@ -1038,7 +1142,7 @@ void SetupSolverHD(HdModule& hd, const Mesh& mesh, HdSolver& s) {
   for (int i = 1; i <= n_interior; ++i) {
     const int f = s.interior_faces[i];
     unit_normal(f, s.interior_ex[i], s.interior_ey[i], s.interior_nn[i]);
-    s.interior_len[i] = F.length[f];
+    s.interior_len[i] = geographic ? s.metric_face_length[f] : F.length[f];
   }
   for (BoundaryFaceRecord& rec : s.boundary_faces) unit_normal(rec.face, rec.ex, rec.ey, rec.nn);
 
@@ -1051,7 +1155,7 @@ void SetupSolverHD(HdModule& hd, const Mesh& mesh, HdSolver& s) {
     s.filter_u.assign(ne, 0.0);
     s.filter_v.assign(ne, 0.0);
     s.filter_weight.assign(ne);
-    for (int e = 1; e <= ne; ++e) s.filter_weight[e] = E.area[e];
+    for (int e = 1; e <= ne; ++e) s.filter_weight[e] = ElementAreaMetres(mesh, e);
   }
   s.shallow_depth_option = hd.flood_dry.type;
 }
@@ -1066,7 +1170,7 @@ void CalcDerivativesOnlySW2D(HdModule& hd, HdSolver& s, const Mesh& mesh, Array1
   const FaceLoopInput in = GatherInput(hd, s, mesh);
   const int ne =
       mesh.elements.nelements_int > 0 ? mesh.elements.nelements_int : mesh.elements.nelements;
-  const double* area = mesh.elements.area.data();
+  const double* area = ElementAreasHD(s, mesh);
   const bool sums = dhdt != nullptr && dPdt != nullptr && dQdt != nullptr;
   if (sums) {
     for (Array1<double>* a : {dhdt, dPdt, dQdt}) a->assign(mesh.elements.nelements, 0.0);
@@ -1074,6 +1178,7 @@ void CalcDerivativesOnlySW2D(HdModule& hd, HdSolver& s, const Mesh& mesh, Array1
   VHD_OMP_PARALLEL { FaceTerms(hd, s, mesh, in); }
   if (!sums) return;
   ElementSumsHD(hd, s, mesh, ne, true, 0.0);
+  if (!s.metric_area.empty()) SphereTermsHD(hd, s, mesh, ne);
   VHD_OMP_PARALLEL_FOR
   for (int e = 1; e <= ne; ++e) {
     const double inv = 1.0 / area[e];
@@ -1098,6 +1203,7 @@ void CALCDERIVATIVESW2D(HdModule& hd, HdSolver& s, const Mesh& mesh, int stage, 
     LimitOutflowHD(hd, s, mesh, in);
     ElementSumsHD(hd, s, mesh, ne, first_stage, 0.0);
   }
+  if (!s.metric_area.empty()) SphereTermsHD(hd, s, mesh, ne);
   auto with_sources = [&](auto first, auto last, auto iterate) {
     if (!SourcesActive(s)) {
       UpdateElementsHD<first, last, iterate, false>(hd, s, mesh, ne, dt);

@@ -88,7 +88,7 @@ struct BoundaryFaceRecord {
   int element = 0;  // inner element (element1 of the face)
   int kind = kBoundaryLand;
   double values[8] = {0, 0, 0, 0, 0, 0, 0, 0};  // prepared outer values of the kind
-  double ex = 0, ey = 0, nn = 0;  // unit outward normal and the length of the mesh normal
+  double ex = 0, ey = 0, nn = 0;  // unit outward normal and the length of the mesh normal (as interior faces)
 };
 
 // The solver's own setup-time tables and work arrays (allocated once).
@@ -107,9 +107,24 @@ struct HdSolver {
   // Per interior face, in the order of interior_faces (so that the faces of
   // a chunk of the face loop lie side by side): the unit normal (ex, ey), the
   // length nn of the mesh normal (nx = nn ex; nn is 1 on Cartesian meshes)
-  // and the face length. (The face still water depth d_f of the bed-slope
-  // term is HdState::face_d, set here at setup.)
+  // and the face length. On a geographic mesh the normal and the length are
+  // those on the sphere (FaceMetres: east and north components, metres) and
+  // nn is 1. (The face still water depth d_f of the bed-slope term is
+  // HdState::face_d, set here at setup.)
   Array1<double> interior_ex, interior_ey, interior_nn, interior_len;
+
+  // Geographic meshes only (empty on Cartesian meshes, whose own areas and
+  // lengths serve): element areas (m2) and face lengths (m) on the sphere,
+  // and per element the sum over its faces of the outward unit normal times
+  // the face length (m). On the sphere that sum is not zero (an element's
+  // faces nearer the pole are shorter); the element update balances the face
+  // pressures with it (SphereTermsHD in sw_fluxes.cpp).
+  Array1<double> metric_area, metric_face_length, metric_closure_x, metric_closure_y;
+  // Geographic mesh across the 180-degree meridian: the longitudes of the
+  // centroids and face centres made continuous over the mesh, for the
+  // offsets of the face reconstruction (empty otherwise, and for a mesh
+  // around the whole globe).
+  Array1<double> continuous_xc, continuous_xf;
 
   // Momentum terms of the current stage, four per face f at 4f .. 4f + 3:
   // x and y of the element1 side, then of the element2 side (m4/s2; zero on
@@ -164,6 +179,12 @@ struct HdSolver {
   // face through the scalar path, which gives the same bits (for checks).
   bool vector_faces = true;
 };
+
+// Element areas (m2) of the fluxes: the solver's own on a geographic mesh,
+// else the mesh's.
+inline const double* ElementAreasHD(const HdSolver& s, const Mesh& mesh) {
+  return s.metric_area.empty() ? mesh.elements.area.data() : s.metric_area.data();
+}
 
 // Whether element source terms act in the stage (all three allocated).
 inline bool SourcesActive(const HdSolver& s) {

@@ -515,6 +515,33 @@ void CalcFaceValues(FaceTable& fc, const ElementTable& el, const NodeTable& nd, 
   }
 }
 
+void FaceMetres(const Mesh& mesh, int f, double& nx, double& ny, double& length) {
+  const FaceTable& fc = mesh.faces;
+  if (!IsGeographic(mesh.projection)) {
+    nx = fc.nx[f], ny = fc.ny[f], length = fc.length[f];
+    return;
+  }
+  // The stored normal (dlat, -dlon) / L with the east component of the edge
+  // shortened by cos(lat): (R dlat, -R cos(lat) dlon) = R L (nx, cos(lat) ny).
+  const double mx = fc.nx[f], my = fc.ny[f] * fc.cos_lat[f];
+  const double m = std::hypot(mx, my);
+  nx = m > 0 ? mx / m : 0.0;
+  ny = m > 0 ? my / m : 0.0;
+  length = kMeshEarthRadius * fc.length[f] * m;
+}
+
+double FaceLengthMetres(const Mesh& mesh, int f) {
+  double nx, ny, length;
+  FaceMetres(mesh, f, nx, ny, length);
+  return length;
+}
+
+double ElementAreaMetres(const Mesh& mesh, int e) {
+  const ElementTable& el = mesh.elements;
+  if (!IsGeographic(mesh.projection)) return el.area[e];
+  return el.area[e] * kMeshEarthRadius * kMeshEarthRadius * el.cos_lat[e];
+}
+
 void CalcNodeValues(Mesh& mesh) {
   NodeTable& nd = mesh.nodes;
   const ElementTable& el = mesh.elements;

@@ -289,6 +289,16 @@ void CalcFaceValues(FaceTable& faces, const ElementTable& elements, const NodeTa
                     const std::string& projection);
 void CalcNodeValues(Mesh& mesh);
 
+// Geometry of a 2D face and element in metres, as the flow sees it: on a
+// "LONG/LAT" mesh the (longitude, latitude) plane in radians mapped onto the
+// sphere of kMeshEarthRadius at the stored cos(latitude) (R cos(lat) dlon
+// east, R dlat north); on any other mesh the stored values themselves.
+// Unit normal (east and north components) and length of face f:
+void FaceMetres(const Mesh& mesh, int f, double& nx, double& ny, double& length);
+double FaceLengthMetres(const Mesh& mesh, int f);
+// Area of element e (m2).
+double ElementAreaMetres(const Mesh& mesh, int e);
+
 void CreateNodeElementConnectivity(Mesh& mesh);
 void CreateNodeNodeConnectivity(Mesh& mesh);
 void CreateElementFaceConnectivity(Mesh& mesh);

@@ -45,14 +45,13 @@ inline void SetFloodDry(HdModule& hd, double h_dry, double h_flood, double h_mas
   hd.flood_dry.mass_depth = h_mass;
 }
 
-// Generates the mesh and allocates the state; the bed comes from spec.bed.
-// Defaults: no bed resistance, no eddy viscosity, no flooding and drying,
-// CFL 0.9, dt_max = overall step.
-inline void MakeCase(SwCase& c, const RectangleMeshSpec& spec, double overall_dt) {
+// Completes the filled mesh c.mesh and allocates the state. Defaults: no bed
+// resistance, no eddy viscosity, no flooding and drying, CFL 0.9, dt_max =
+// overall step.
+inline void MakeCaseOnMesh(SwCase& c, double overall_dt) {
   // Validation runs use one thread: the machine is shared, and the thread
   // test sets its own counts.
   OmpSetThreads(1);
-  GenerateRectangleMesh(spec, c.mesh);
   SetupMeshGeometry(c.mesh);
   HdModule& hd = c.hd;
   hd.bed.type = kBedNone;
@@ -64,7 +63,16 @@ inline void MakeCase(SwCase& c, const RectangleMeshSpec& spec, double overall_dt
   hd.time_step.dt_min_HD = std::min(0.01, overall_dt / 100);
   hd.time_step.CFL_correction_HD = 0;
   hd.flood_dry.elevation_limit = 1e6;
+  // As the module setup sets them from the mesh's projection.
+  hd.projection = IsGeographic(c.mesh.projection) ? 2 : 1;
+  hd.metric_radius = hd.projection == 2 ? kPhysical.earth_radius : 1.0;
   AllocateStateHD(hd, c.mesh);
+}
+
+// Generates the mesh (the bed from spec.bed) and makes the case on it.
+inline void MakeCase(SwCase& c, const RectangleMeshSpec& spec, double overall_dt) {
+  GenerateRectangleMesh(spec, c.mesh);
+  MakeCaseOnMesh(c, overall_dt);
 }
 
 // Initial surface and velocity as functions of the centroid; depths below
@@ -98,10 +106,10 @@ inline void RunTo(SwCase& c, double t_end) {
   }
 }
 
-// Volume of water sum h A over the owned elements.
+// Volume of water sum h A over the owned elements (m3, also on the sphere).
 inline double Volume(const SwCase& c) {
   double v = 0.0;
-  for (int e = 1; e <= c.hd.state.nelements_owned; ++e) v += c.hd.state.h[e] * c.mesh.elements.area[e];
+  for (int e = 1; e <= c.hd.state.nelements_owned; ++e) v += c.hd.state.h[e] * ElementAreaMetres(c.mesh, e);
   return v;
 }
 
