@@ -76,6 +76,8 @@ class Module {
   // that would have gone on past n.
   virtual void FinishOutputs(int /*n*/) {}
   virtual void CloseOutputs() {}
+  // Closes the module's input data files (each logs its "Data File Summary").
+  virtual void CloseInputs() {}
   // With several processes, after the outputs are closed.
   virtual void OutputStatistics() {}
   virtual void PrintStatistics() {}

@@ -131,6 +131,7 @@ void RunTimeLoop(ModuleSet& modules, const TimeAxis& time, const ModuleSelection
     if (run_status < 0) m->WriteOutput(-1);
     if (run_status > 0) m->FinishOutputs(n_done);
     m->CloseOutputs();
+    m->CloseInputs();
   }
   if (run.nprocesses > 1) {
     BarrierAll(run);
