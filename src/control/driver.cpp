@@ -96,6 +96,7 @@ int RunVantorHD(int argc, char** argv) {
   ModuleSelection selection;
   Domain domain;
   SetupDomain(run, domain, selection);
+  StopIfSignalled();
   ReadModuleSelection(selection);
 
   int nthreads = run.process_id <= 0 ? ThreadCountFor(-1, resources) : 0;
@@ -105,6 +106,7 @@ int RunVantorHD(int argc, char** argv) {
   ModuleSet modules;
   SetupModules(modules, ModuleContext{run, time, selection, domain});
   SktReportUnusedKeywords();
+  StopIfSignalled();
 
   StopTiming(overall, kTimerPre);
   RunTimeLoop(modules, time, selection, run, run.process_id <= 0 ? &progress : nullptr, overall);
@@ -115,6 +117,7 @@ int RunVantorHD(int argc, char** argv) {
 
   PrintMemoryUsage(PeakMemoryMiB());
   PrintPerformance(run.nthreads, run.gpu_devices);
+  StopIfSignalled();
   WriteCompletion(run.run_status);
   progress.Close();
   SktClose();

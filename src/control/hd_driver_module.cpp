@@ -45,6 +45,8 @@ void HdDriverModule::Step(const StepTimes& times, int& run_status) {
 
 void HdDriverModule::CloseOutputs() { CloseOutputFilesHD(outputs_); }
 
+void HdDriverModule::CloseInputs() { CloseBoundaryDataHD(hd_.boundary); }
+
 void HdDriverModule::OutputStatistics() { OutputStatisticsHD(outputs_, *run_); }
 
 void HdDriverModule::PrintStatistics() {

@@ -20,6 +20,7 @@ class HdDriverModule final : public Module {
   double TimeStep(double t, double t_end) override;
   void Step(const StepTimes& times, int& run_status) override;
   void CloseOutputs() override;
+  void CloseInputs() override;
   void OutputStatistics() override;
   void PrintStatistics() override;
   void PrintTimings() override;

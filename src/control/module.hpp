@@ -13,6 +13,7 @@
 
 #include <array>
 #include <memory>
+#include <string>
 #include <string_view>
 
 #include "core/run.hpp"
@@ -23,9 +24,11 @@ namespace vhd {
 enum class ModuleKind { HD, TR, ST, MT, VT, PT };
 inline constexpr int kModuleKinds = 6;
 
-// Name of a slot ("HD", "TR", ...) and the keyword of its mode.
+// Name of a slot ("HD", "TR", ...), the keyword of its mode and the name of
+// its setup section ("mode_of_transport_module" -> "TRANSPORT_MODULE").
 std::string_view ModuleKindName(ModuleKind kind);
 std::string_view ModuleModeKeyword(ModuleKind kind);
+std::string ModuleSectionName(ModuleKind kind);
 // Mode of a slot in the module selection.
 int ModuleMode(const ModuleSelection& selection, ModuleKind kind);
 
@@ -73,6 +76,8 @@ class Module {
   // that would have gone on past n.
   virtual void FinishOutputs(int /*n*/) {}
   virtual void CloseOutputs() {}
+  // Closes the module's input data files (each logs its "Data File Summary").
+  virtual void CloseInputs() {}
   // With several processes, after the outputs are closed.
   virtual void OutputStatistics() {}
   virtual void PrintStatistics() {}
@@ -110,7 +115,9 @@ inline constexpr std::array<ModuleKind, 6> kReportOrder = kSetupOrder;
 std::unique_ptr<Module> CreateModule(ModuleKind kind, int mode);
 
 // Creates and sets up the active modules in setup order. A selected module
-// that this build does not have is a fatal error naming its keyword.
+// that this build does not have is a fatal error naming its keyword. The
+// section of a module that is off is skipped: its keywords are not reported
+// as unused.
 void SetupModules(ModuleSet& modules, const ModuleContext& context);
 
 }  // namespace vhd

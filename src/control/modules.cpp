@@ -1,7 +1,9 @@
+#include <cctype>
 #include <string>
 
 #include "control/hd_driver_module.hpp"
 #include "control/module.hpp"
+#include "io/setup.hpp"
 #include "log/log.hpp"
 
 namespace vhd {
@@ -57,15 +59,31 @@ std::unique_ptr<Module> CreateModule(ModuleKind kind, int /*mode*/) {
   }
 }
 
+std::string ModuleSectionName(ModuleKind kind) {
+  std::string name(ModuleModeKeyword(kind).substr(std::string_view("mode_of_").size()));
+  for (char& c : name) c = static_cast<char>(std::toupper(static_cast<unsigned char>(c)));
+  return name;
+}
+
 void SetupModules(ModuleSet& modules, const ModuleContext& context) {
   for (const ModuleKind kind : kSetupOrder) {
     const int mode = ModuleMode(context.selection, kind);
-    if (mode <= 0) continue;
+    if (mode <= 0) {
+      // The section of a module that is off is not read; its keywords are
+      // not reported as unused.
+      int status = 0;
+      SktOpenSection(ModuleSectionName(kind), kNoIndex, &status, false);
+      if (status == 0) {
+        SktSkipSection();
+        SktCloseSection();
+      }
+      continue;
+    }
     std::unique_ptr<Module> module = CreateModule(kind, mode);
     if (!module)
       FatalError("MODULE_SELECTION: " + std::string(ModuleModeKeyword(kind)) + " = " +
-                 std::to_string(mode) + ", but this build has no " +
-                 std::string(ModuleTitle(kind)) + " module");
+                 std::to_string(mode) + ": the " + std::string(ModuleTitle(kind)) +
+                 " module is not available in this build");
     module->Setup(context);
     modules.Set(kind, std::move(module));
   }

@@ -17,9 +17,11 @@ namespace vhd {
 
 namespace {
 
-constexpr int kHandledSignals[] = {SIGABRT, SIGILL, SIGINT, SIGSEGV, SIGTERM, SIGFPE};
+constexpr int kHandledSignals[] = {SIGABRT, SIGILL, SIGINT, SIGSEGV, SIGTERM, SIGFPE, SIGALRM};
 
 volatile std::sig_atomic_t g_in_handler = 0;
+volatile std::sig_atomic_t g_pending_request = 0;  // interrupt or termination not yet acted on
+volatile std::sig_atomic_t g_grace_seconds = 10;
 
 #if defined(__x86_64__)
 // Masks the underflow trap in the interrupted context, so that the faulting
@@ -43,11 +45,25 @@ void HandleSignal(int signo, siginfo_t* info, void* context) {
     MaskUnderflowTrap(context);
     return;
   }
+  if (signo == SIGALRM) {
+    // Not armed by a request: the default action.
+    if (g_pending_request == 0) {
+      signal(SIGALRM, SIG_DFL);
+      raise(SIGALRM);
+      return;
+    }
+    // The request was not taken up in time.
+    signo = g_pending_request;
+  } else if ((signo == SIGINT || signo == SIGTERM) && g_pending_request == 0) {
+    g_pending_request = signo;
+    alarm(static_cast<unsigned>(g_grace_seconds));
+    return;
+  }
   // A second signal while the first one is being reported (for example a
   // fault inside the log writer) ends the process at once.
   if (g_in_handler) _exit(signo);
   g_in_handler = 1;
-  StopRun(SignalMessage(signo, code), signo);
+  StopRunInSignalHandler(SignalMessage(signo, code), signo);
 }
 
 }  // namespace
@@ -92,13 +108,22 @@ std::string_view SignalMessage(int signo, int fpe_code) {
   }
 }
 
-void InstallSignalHandlers() {
+void InstallSignalHandlers(unsigned grace_seconds) {
+  g_grace_seconds = static_cast<std::sig_atomic_t>(grace_seconds);
   struct sigaction action {};
   action.sa_sigaction = HandleSignal;
   action.sa_flags = SA_SIGINFO;
   sigemptyset(&action.sa_mask);
   for (const int signo : kHandledSignals) sigaddset(&action.sa_mask, signo);
   for (const int signo : kHandledSignals) sigaction(signo, &action, nullptr);
+}
+
+void StopIfSignalled() {
+  const int signo = g_pending_request;
+  if (signo == 0) return;
+  alarm(0);
+  g_in_handler = 1;
+  StopRun(SignalMessage(signo, 0), signo);
 }
 
 }  // namespace vhd

@@ -3,6 +3,7 @@
 #include <cmath>
 
 #include "control/progress.hpp"
+#include "control/signals.hpp"
 #include "parallel/message_passing.hpp"
 
 namespace vhd {
@@ -28,6 +29,7 @@ int RunSubSteps(ModuleSet& modules, int n, double dt, int& run_status) {
       m->Step(times, run_status);
       if (run_status < 0) return count;
     }
+    StopIfSignalled();
   }
   return count;
 }
@@ -117,6 +119,7 @@ void RunTimeLoop(ModuleSet& modules, const TimeAxis& time, const ModuleSelection
       }
       run_status = AgreeRunStatus(run_status, run);
       StopTiming(overall, kTimerCalc);
+      StopIfSignalled();
     }
     WriteBanner("COMPUTATION ENDED");
   }
@@ -128,6 +131,7 @@ void RunTimeLoop(ModuleSet& modules, const TimeAxis& time, const ModuleSelection
     if (run_status < 0) m->WriteOutput(-1);
     if (run_status > 0) m->FinishOutputs(n_done);
     m->CloseOutputs();
+    m->CloseInputs();
   }
   if (run.nprocesses > 1) {
     BarrierAll(run);

@@ -177,6 +177,10 @@ struct HdBoundary {
 // time axis) and the state's still water depths; mesh is the velocity mesh.
 void SetupBoundCondHD(HdModule& hd, const Mesh& mesh, HdBoundary& bc);
 
+// Closes the data files of the boundary codes; each logs its "Data File
+// Summary". Called once at the end of the run.
+void CloseBoundaryDataHD(HdBoundary& bc);
+
 // Builds the face-condition list from the codes' faces, with the cyclic
 // pairing and its checks.
 void CalcFaceBC(const Mesh& mesh, HdBoundary& bc);

@@ -380,4 +380,11 @@ void LinkBoundaryFacesHD(const HdBoundary& bc, HdSolver& solver) {
   }
 }
 
+void CloseBoundaryDataHD(HdBoundary& bc) {
+  for (int c = 1; c <= bc.ncodes; ++c) {
+    BoundaryCondition& code = bc.codes[c];
+    for (int i = 0; i < code.ndata; ++i) FemDataClose(code.data[i]);
+  }
+}
+
 }  // namespace vhd

@@ -351,6 +351,11 @@ void SetupFloodDryHD(HdModule& hd);
 void SetupEddy(HdModule& hd, const Mesh& mesh);
 void SetupBedResistanceHD(HdModule& hd, const Mesh& mesh);
 void SetupSolutionMethodHD(HdModule& hd);
+// Forcing, source and temperature-salinity sections of the HD module for
+// features this build does not have: a section that switches one on (type or
+// mode above 0, or sources listed) is a fatal error saying so; one that
+// leaves it off is skipped.
+void RefuseUnavailableFeaturesHD();
 void SetupInitialConditionsHD(HdModule& hd);
 
 // Allocates every HdState array for the mesh (codes 1, metric arrays, bed

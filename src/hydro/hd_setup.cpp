@@ -38,7 +38,55 @@ void ReadMeshIndex(std::string_view key, int& index, int nmeshes) {
   }
 }
 
+// Sections of the HD module for features this build does not have. Each is
+// off when every one of its switches is 0; a switch that is absent takes the
+// default given (CORIOLIS is on unless its type says otherwise).
+struct FeatureSwitch {
+  const char* key = nullptr;
+  int def = 0;
+};
+
+struct UnavailableFeature {
+  const char* section;
+  const char* title;
+  FeatureSwitch switches[2];
+};
+
+constexpr UnavailableFeature kUnavailableFeatures[] = {
+    {"DEPTH", "A time-varying depth correction", {{"type", 0}}},
+    {"CORIOLIS", "Coriolis forcing", {{"type", 2}}},
+    {"WIND_FORCING", "Wind forcing", {{"type", 0}}},
+    {"PRECIPITATION_EVAPORATION", "Precipitation and evaporation",
+     {{"type_of_precipitation", 0}, {"type_of_evaporation", 0}}},
+    {"INFILTRATION", "Infiltration", {{"type", 0}}},
+    {"SOURCES", "Sources and sinks", {{"number_of_sources", 0}}},
+    {"RADIATION_STRESS", "Radiation stress", {{"type", 0}}},
+    {"ICE", "Ice cover", {{"type", 0}}},
+    {"TIDAL_POTENTIAL", "Tidal potential", {{"type", 0}}},
+    {"TEMPERATURE_SALINITY_MODULE", "Temperature and salinity", {{"temperature_mode", 0}, {"salinity_mode", 0}}},
+};
+
 }  // namespace
+
+void RefuseUnavailableFeaturesHD() {
+  for (const UnavailableFeature& feature : kUnavailableFeatures) {
+    if (!OpenOptionalSectionHD(feature.section)) continue;
+    for (const FeatureSwitch& sw : feature.switches) {
+      if (!sw.key) continue;
+      const bool given = SktHasKeyword(sw.key);
+      int value = sw.def;
+      SktReadKeyword(sw.key, value, sw.def);
+      if (value > 0) {
+        FatalError("SetupHD: " + std::string(feature.title) + " is not available in this build (" + sw.key +
+                   " = " + std::to_string(value) + (given ? "" : ", the default") + " in " + SktSectionPath() +
+                   ")");
+      }
+    }
+    // Switched off: its other keywords are not read.
+    SktSkipSection();
+    SktCloseSection();
+  }
+}
 
 // ---- setup -----------------------------------------------------------------------
 
@@ -77,6 +125,7 @@ void SetupHD(HdModule& hd, const RunControl& run, const TimeAxis& time, const Mo
   SetupFloodDryHD(hd);
   SetupEddy(hd, mesh);
   SetupBedResistanceHD(hd, mesh);
+  RefuseUnavailableFeaturesHD();
   SetupSolutionMethodHD(hd);
   if (hd.mode == 2) SetupInitialConditionsHD(hd);
   SetupBoundCondHD(hd, mesh, hd.boundary);

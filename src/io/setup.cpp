@@ -5,6 +5,7 @@
 #include <fmt/core.h>
 
 #include <algorithm>
+#include <cctype>
 #include <charconv>
 #include <cmath>
 #include <cstdint>
@@ -12,6 +13,7 @@
 #include <filesystem>
 #include <fstream>
 #include <limits>
+#include <map>
 #include <memory>
 #include <set>
 #include <sstream>
@@ -39,6 +41,10 @@ struct SetupState {
   std::set<const toml::node*> used_keys;      // keyword nodes asked for
   std::set<const toml::node*> used_values;    // parameter nodes read
   std::set<const toml::table*> skipped;       // sections skipped on purpose, with all below them
+  // Names of sections and keywords that a reader looked for, per table, for
+  // the suggestions of the unused report.
+  std::map<const toml::table*, std::set<std::string>> asked_sections;
+  std::map<const toml::table*, std::set<std::string>> asked_keys;
 };
 
 SetupState& State() {
@@ -49,6 +55,15 @@ SetupState& State() {
 const toml::table* CurrentTable() {
   const SetupState& s = State();
   return s.stack.empty() ? s.root.get() : s.stack.back().table;
+}
+
+// The section `name` of the current section (the document root when none is
+// current), remembered as looked for.
+const toml::node* LookUpSection(std::string_view name) {
+  const toml::table* table = CurrentTable();
+  if (!table) return nullptr;
+  State().asked_sections[table].emplace(name);
+  return table->get(name);
 }
 
 bool IsSection(const toml::node& node) { return node.is_table() || node.is_array_of_tables(); }
@@ -144,6 +159,7 @@ KeywordLookup FindKeyword(std::string_view key, int instance) {
   KeywordLookup found;
   const toml::table* table = CurrentTable();
   if (!table) return found;
+  State().asked_keys[table].emplace(key);
   const toml::node* node = table->get(key);
   if (!node) return found;
   found.keyword = node;
@@ -373,6 +389,8 @@ void SktClose() {
   s.used_keys.clear();
   s.used_values.clear();
   s.skipped.clear();
+  s.asked_sections.clear();
+  s.asked_keys.clear();
 }
 
 bool SktIsOpen() { return State().root != nullptr; }
@@ -392,7 +410,11 @@ std::string SktResolvePath(std::string_view name) {
 
 void SktOpenTarget(std::string_view name, int* status) {
   SetupState& s = State();
-  const toml::node* node = s.root ? s.root->get(name) : nullptr;
+  const toml::node* node = nullptr;
+  if (s.root) {
+    s.asked_sections[s.root.get()].emplace(name);
+    node = s.root->get(name);
+  }
   if (!node || !node->is_table()) {
     if (status) {
       *status = -1;
@@ -411,8 +433,7 @@ void SktOpenTarget(std::string_view name, int* status) {
 void SktOpenSection(std::string_view name, int index, int* status, bool log, int instance) {
   SetupState& s = State();
   const std::string full = SectionName(name, index);
-  const toml::table* parent = CurrentTable();
-  const toml::node* node = parent ? parent->get(full) : nullptr;
+  const toml::node* node = LookUpSection(full);
   const toml::table* table = nullptr;
   if (node && node->is_table() && instance == 1) {
     table = node->as_table();
@@ -471,8 +492,7 @@ void SktSkipSection() {
 bool SktSectionExists(std::string_view name, int index) { return SktNumberOfSectionInstances(SectionName(name, index)) > 0; }
 
 int SktNumberOfSectionInstances(std::string_view name) {
-  const toml::table* table = CurrentTable();
-  const toml::node* node = table ? table->get(name) : nullptr;
+  const toml::node* node = LookUpSection(name);
   if (!node) return 0;
   if (node->is_table()) return 1;
   if (node->is_array_of_tables()) return static_cast<int>(node->as_array()->size());
@@ -541,22 +561,112 @@ void SktReadKeyword(std::string_view key, std::vector<double>& values, int n,
   ReadArray(key, values, n, def, arg);
 }
 
-// ---- unused keywords ----------------------------------------------------------------
+// ---- unused keywords and sections ----------------------------------------------------
+
+namespace {
+
+struct Unused {
+  int line;
+  std::string text;
+};
+
+// Edit distance of two names with case ignored; swapping two neighbouring
+// letters counts as one edit.
+int EditDistance(std::string_view a, std::string_view b) {
+  const std::size_t n = a.size(), m = b.size();
+  std::vector<std::vector<int>> d(n + 1, std::vector<int>(m + 1, 0));
+  for (std::size_t i = 0; i <= n; ++i) d[i][0] = static_cast<int>(i);
+  for (std::size_t j = 0; j <= m; ++j) d[0][j] = static_cast<int>(j);
+  auto up = [](char c) { return static_cast<char>(std::toupper(static_cast<unsigned char>(c))); };
+  for (std::size_t i = 1; i <= n; ++i) {
+    for (std::size_t j = 1; j <= m; ++j) {
+      const int cost = up(a[i - 1]) == up(b[j - 1]) ? 0 : 1;
+      d[i][j] = std::min({d[i - 1][j] + 1, d[i][j - 1] + 1, d[i - 1][j - 1] + cost});
+      if (i > 1 && j > 1 && up(a[i - 1]) == up(b[j - 2]) && up(a[i - 2]) == up(b[j - 1]))
+        d[i][j] = std::min(d[i][j], d[i - 2][j - 2] + 1);
+    }
+  }
+  return d[n][m];
+}
+
+// A numbered section's name without its number ("CODE_2", "CODE_M2" -> "CODE").
+std::string_view NumberStem(std::string_view name) {
+  std::size_t end = name.size();
+  while (end > 0 && std::isdigit(static_cast<unsigned char>(name[end - 1]))) --end;
+  if (end == name.size()) return name;
+  if (end > 1 && name[end - 1] == 'M' && name[end - 2] == '_') return name.substr(0, end - 2);
+  if (end > 0 && name[end - 1] == '_') return name.substr(0, end - 1);
+  return name;
+}
+
+// "; did you mean X?" for the nearest of the names a reader looked for, when
+// it lies within two edits (and the edits are less than half of it). A name
+// that differs only in its number gets none: CODE_7 is not a typing slip of
+// CODE_1.
+std::string Suggestion(std::string_view name, const std::map<const toml::table*, std::set<std::string>>& asked,
+                       const toml::table* table) {
+  const auto it = asked.find(table);
+  if (it == asked.end()) return {};
+  const std::string* best = nullptr;
+  int best_distance = 3;
+  for (const std::string& candidate : it->second) {
+    if (candidate == name || NumberStem(candidate) == NumberStem(name)) continue;
+    const int distance = EditDistance(name, candidate);
+    if (distance < best_distance && 2 * distance < static_cast<int>(candidate.size())) {
+      best = &candidate;
+      best_distance = distance;
+    }
+  }
+  return best ? fmt::format("; did you mean {}?", *best) : std::string();
+}
+
+// Sections below `table` that no reader opened, each reported once (not the
+// sections below it), and the keywords of the document root.
+void CollectUnusedSections(const toml::table& table, const std::string& path,
+                           const std::map<const toml::table*, std::string>& opened, std::vector<Unused>& unused) {
+  const SetupState& s = State();
+  const std::string where = path.empty() ? std::string() : " in section " + path;
+  auto visit = [&](const toml::table& section, const std::string& name) {
+    if (s.skipped.count(&section)) return;
+    const auto found = opened.find(&section);
+    if (found != opened.end()) {
+      CollectUnusedSections(section, found->second, opened, unused);
+      return;
+    }
+    const int line = LineOf(section);
+    unused.push_back({line, fmt::format("Section {}{}, line {}: not used{}", name, where, line,
+                                        Suggestion(name, s.asked_sections, &table))});
+  };
+  for (const auto& [key, node] : table) {
+    if (const toml::table* t = node.as_table()) {
+      visit(*t, std::string(key.str()));
+    } else if (node.is_array_of_tables()) {
+      const toml::array& a = *node.as_array();
+      for (std::size_t k = 0; k < a.size(); ++k) {
+        visit(*a.get(k)->as_table(), k == 0 ? std::string(key.str()) : fmt::format("{}({})", key.str(), k + 1));
+      }
+    } else if (path.empty()) {
+      unused.push_back({LineOf(node), fmt::format("Keyword {} outside the target, line {}: not used", key.str(),
+                                                  LineOf(node))});
+    }
+  }
+}
+
+}  // namespace
 
 void SktReportUnusedKeywords() {
   const SetupState& s = State();
-  struct Unused {
-    int line;
-    std::string text;
-  };
   std::vector<Unused> unused;
+  std::map<const toml::table*, std::string> opened;
+  for (const Frame& f : s.opened) opened.emplace(f.table, f.path);
+  if (s.root) CollectUnusedSections(*s.root, std::string(), opened, unused);
   for (const Frame& f : s.opened) {
     if (s.skipped.count(f.table)) continue;
     for (const auto& [key, node] : *f.table) {
       if (IsSection(node)) continue;
       const std::string where = fmt::format("Keyword {} in section {}, line {}", key.str(), f.path, LineOf(node));
       if (!s.used_keys.count(&node)) {
-        unused.push_back({LineOf(node), where + ": not used"});
+        unused.push_back({LineOf(node), where + ": not used" + Suggestion(key.str(), s.asked_keys, f.table)});
         continue;
       }
       // A keyword read only in part: the parameters no reader asked for.

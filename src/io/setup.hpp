@@ -101,10 +101,15 @@ void SktReadKeyword(std::string_view key, std::vector<int>& values, int n,
 void SktReadKeyword(std::string_view key, std::vector<double>& values, int n,
                     std::optional<std::vector<double>> def = {}, SktArg arg = {});
 
-// After all module setups: a warning for every keyword of an opened section
-// that no reader asked for, naming its path and line, and for the parameters
-// of a keyword that no reader read ("dt = [30, 40]" read as one value).
-// Sections never opened, and sections skipped with SktSkipSection, are not reported.
+// After all module setups, warnings naming path and line for
+//   - every keyword of an opened section that no reader asked for, and the
+//     parameters of a keyword that no reader read ("dt = [30, 40]" read as one
+//     value);
+//   - every section that no reader opened (once, not its keywords nor the
+//     sections below it), and every keyword outside the target.
+// A name within two edits of one a reader looked for in the same section
+// gets "did you mean ...". Sections skipped with SktSkipSection, and all below
+// them, are not reported.
 void SktReportUnusedKeywords();
 
 }  // namespace vhd

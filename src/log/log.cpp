@@ -4,6 +4,10 @@
 
 #include <fmt/core.h>
 
+#include <unistd.h>
+
+#include <cerrno>
+#include <csignal>
 #include <cstdio>
 #include <cstdlib>
 #include <ctime>
@@ -23,6 +27,11 @@ LogState& State() {
   static LogState state;
   return state;
 }
+
+// What a signal handler may read: the log's file descriptor (-1: none) and
+// whether the user's copy of a stop message is dropped (BUILDMODE=NIGHT).
+volatile std::sig_atomic_t g_log_fd = -1;
+volatile std::sig_atomic_t g_night_build = 0;
 
 std::string_view TrimRight(std::string_view text) {
   const auto end = text.find_last_not_of(' ');
@@ -99,6 +108,8 @@ bool OpenLogFile(const std::string& name) {
   s.file = std::fopen(name.c_str(), "w");
   if (!s.file) return false;
   s.path = name;
+  g_night_build = NightBuild() ? 1 : 0;
+  g_log_fd = fileno(s.file);
   const std::time_t now = std::time(nullptr);
   std::tm local{};
   localtime_r(&now, &local);
@@ -109,6 +120,7 @@ bool OpenLogFile(const std::string& name) {
 
 void CloseLogFile() {
   LogState& s = State();
+  g_log_fd = -1;
   if (s.file) std::fclose(s.file);
   s.file = nullptr;
   s.path.clear();
@@ -166,6 +178,37 @@ void StopRun(std::string_view text, int status) {
   if (!log || !NightBuild()) ShowToUser(body);
   if (log) WriteRecord(status == 0 ? "Successful completion" : "Abnormal completion");
   kwoExit(status);
+}
+
+namespace {
+
+void WriteAll(int fd, std::string_view text) noexcept {
+  const char* p = text.data();
+  std::size_t n = text.size();
+  while (n > 0) {
+    const ssize_t written = ::write(fd, p, n);
+    if (written < 0 && errno == EINTR) continue;
+    if (written <= 0) return;
+    p += written;
+    n -= static_cast<std::size_t>(written);
+  }
+}
+
+}  // namespace
+
+void StopRunInSignalHandler(std::string_view text, int status) noexcept {
+  const int fd = g_log_fd;
+  if (fd >= 0) {
+    WriteAll(fd, text);
+    WriteAll(fd, "\n");
+  }
+  if (fd < 0 || !g_night_build) {
+    WriteAll(STDOUT_FILENO, " ");
+    WriteAll(STDOUT_FILENO, text);
+    WriteAll(STDOUT_FILENO, "\n");
+  }
+  if (fd >= 0) WriteAll(fd, "Abnormal completion\n");
+  _exit(status);
 }
 
 void SetExitHook(ExitHook hook) { State().exit_hook = hook; }

@@ -37,6 +37,11 @@ void Warning(std::string_view text);       // "Warning: " pieces of 61
 [[noreturn]] void FatalError(std::string_view text);  // "Fatal error: " pieces of 57, exit 1
 [[noreturn]] void StopRun(std::string_view text, int status = 1);
 
+// The end of StopRun(text, status) with status != 0 for a signal handler:
+// only async-signal-safe calls (write, _exit), no message passing shutdown.
+// The log lines written before are all on disk, since every record is flushed.
+[[noreturn]] void StopRunInSignalHandler(std::string_view text, int status) noexcept;
+
 // Process exit through the progress library: runs the installed exit hook
 // (message passing shutdown) and ends the process with the status.
 [[noreturn]] void kwoExit(int status);

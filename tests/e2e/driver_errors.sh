@@ -60,7 +60,7 @@ write_setup "$d/setup.toml" 3
 printf 'mode_of_vitrax_module = 1\n' >> "$d/setup.toml"
 "$VANTORHD" "$d/setup.toml" > "$d/out" 2>&1
 status_is 1 $? "module not in the build"
-contains_joined "$d/setup.log" "mode_of_vitrax_module = 1, but this build has no ecological module"
+contains_joined "$d/setup.log" "mode_of_vitrax_module = 1: the ecological module is not available in this build"
 
 # A time axis that cannot be run.
 d=$(case_dir timeaxis)
@@ -88,5 +88,22 @@ contains "$d/setup.log" "time_step_intervall"
 contains "$d/setup.log" "line 5"
 contains "$d/setup.log" "time_step_interval : 30 (default)"
 contains "$d/setup.log" "  Normal run completion"
+
+# A misspelt section does not pass in silence: the run goes on with a
+# warning that names it, its line and the section it was probably meant as.
+d=$(case_dir misspelt)
+write_setup "$d/setup.toml" 1
+printf '[VantorHD.HYDRODYNAMIC_MODULE.BED_RESISTENCE]\ntype = 4\n' >> "$d/setup.toml"
+"$VANTORHD" "$d/setup.toml" > "$d/out" 2>&1
+status_is 0 $? "misspelt section"
+contains_joined "$d/setup.log" "Warning: Section BED_RESISTENCE in section VantorHD/HYDRODYNAMIC_MODULE, line 16: not used; did you mean BED_RESISTANCE?"
+
+# A feature this build does not have stops the run when it is switched on.
+d=$(case_dir wind)
+write_setup "$d/setup.toml" 1
+printf '[VantorHD.HYDRODYNAMIC_MODULE.WIND_FORCING]\ntype = 1\n' >> "$d/setup.toml"
+"$VANTORHD" "$d/setup.toml" > "$d/out" 2>&1
+status_is 1 $? "wind forcing"
+contains_joined "$d/setup.log" "Wind forcing is not available in this build"
 
 finish

@@ -321,4 +321,15 @@ if errors:
     sys.exit(1)
 PYCHECK
 
+# A boundary series read from a data file is closed at the end of the run,
+# and its "Data File Summary" reaches the log.
+d=$(case_dir input_summary)
+printf 'time,Surface elevation\n2004-01-01 00:00:00,0.0\n2004-01-01 00:10:00,0.2\n' > "$d/level.csv"
+"$BUILD_DIR/bin/zrntool" csv2zrn0 "$d/level.csv" "$d/level.zrn0" --type 100000 > /dev/null
+write_case "$d/setup.toml" 10 "$(printf '0.0\nformat = 1\nfile_name = "level.zrn0"\nitem_number = 1')" 0.0 0 10 10
+"$VANTORHD" "$d/setup.toml" > "$d/out" 2>&1
+status_is 0 $? "run with a boundary series"
+grep -A 2 "^Data File Summary" "$d/setup.log" | grep -q "File .*level.zrn0" ||
+  fail "no Data File Summary of the boundary series in $d/setup.log"
+
 finish

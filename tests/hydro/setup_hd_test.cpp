@@ -203,5 +203,45 @@ TEST(SetupHDDeath, SetupErrorsStopWithTheirMessages) {
   }
 }
 
+// Sections of features this build does not have: switched on they stop the
+// setup naming the feature and the section; switched off they are skipped,
+// keys and all.
+TEST(SetupHDDeath, FeaturesNotInTheBuildStopTheRunWhenSwitchedOn) {
+  const std::string na = " is not available in this build (";
+  struct Case {
+    std::string section, keys, message;
+  } cases[] = {
+      {"WIND_FORCING", "type = 1\n", "Wind forcing" + na + "type = 1 in VantorHD/HYDRODYNAMIC_MODULE/WIND_FORCING)"},
+      {"CORIOLIS", "latitude = 55.0\n", "Coriolis forcing" + na + "type = 2, the default in"},
+      {"TIDAL_POTENTIAL", "type = 3\n", "Tidal potential" + na + "type = 3"},
+      {"PRECIPITATION_EVAPORATION", "type_of_evaporation = 2\n", "evaporation" + na + "type_of_evaporation = 2"},
+      {"SOURCES", "number_of_sources = 1\n", "Sources and sinks" + na + "number_of_sources = 1"},
+      {"ICE", "type = 2\n", "Ice cover" + na + "type = 2"},
+      {"DEPTH", "type = 1\n", "depth correction" + na + "type = 1"},
+      {"RADIATION_STRESS", "type = 1\n", "Radiation stress" + na},
+      {"INFILTRATION", "type = 1\n", "Infiltration" + na},
+      {"TEMPERATURE_SALINITY_MODULE", "salinity_mode = 2\n", "Temperature and salinity" + na + "salinity_mode = 2"},
+  };
+  for (const Case& c : cases) {
+    SCOPED_TRACE(c.section);
+    HdSetupFixture f;
+    f.ExpectSetupStops(kHd + HdSection(c.section, c.keys), Small(), c.message);
+  }
+}
+
+TEST(SetupHD, FeaturesSwitchedOffAreSkipped) {
+  HdSetupFixture f;
+  f.Setup(kHd + HdSection("WIND_FORCING", "type = 0\nconstant_speed = 10.0\n") +
+              HdSection("CORIOLIS", "type = 0\n") + HdSection("SOURCES", "number_of_sources = 0\n") +
+              HdSection("SOURCES.SOURCE_1", "type = 1\n") +
+              HdSection("PRECIPITATION_EVAPORATION", "type_of_precipitation = 0\n"),
+          Small());
+  SktReportUnusedKeywords();
+  const std::string log = f.Log();
+  EXPECT_NE(log.find("Section: WIND_FORCING"), std::string::npos) << log;
+  EXPECT_NE(log.find("number_of_sources : 0"), std::string::npos) << log;
+  EXPECT_EQ(log.find("Warning"), std::string::npos) << log;
+}
+
 }  // namespace
 }  // namespace vhd

@@ -377,15 +377,19 @@ TEST_F(SetupTest, UnusedKeywordsOfOpenedSectionsAreWarned) {
   SktCloseSection();
   SktReportUnusedKeywords();
   const std::vector<std::string> body = Body();
-  ASSERT_EQ(body.size(), 10u);
+  ASSERT_EQ(body.size(), 12u) << test::ReadTextFile(log_path);
   EXPECT_EQ(body[1], "    time_step_interval : 10 (default)");
   EXPECT_EQ(body[4], "");
-  EXPECT_EQ(Unwrap(body, 5, 9), "Warning: Keyword time_step_intervall in section VantorHD/TIME, line 4: not used");
+  EXPECT_EQ(Unwrap(body, 5, 9),
+            "Warning: Keyword time_step_intervall in section VantorHD/TIME, line 4: not used; did you mean "
+            "time_step_interval?");
   EXPECT_EQ(body[7], "");
   EXPECT_EQ(Unwrap(body, 8, 9),
             "Warning: Keyword start_time in section VantorHD/TIME, line 5: parameter(s) 2 3 not used");
-  // The section that was never opened is not reported.
+  // The section that was never opened is reported as a whole, not key by key.
   EXPECT_EQ(test::ReadTextFile(log_path).find("anything"), std::string::npos);
+  EXPECT_EQ(body[10], "");
+  EXPECT_EQ(Unwrap(body, 11, 9), "Warning: Section OFF_MODULE in section VantorHD, line 7: not used");
 }
 
 // A section opened only to find that it is switched off is skipped: none of
@@ -450,6 +454,64 @@ TEST_F(SetupTest, SkippedSectionsAreNotReportedKeyByKey) {
   ASSERT_EQ(warnings.size(), 2u) << log;
   EXPECT_EQ(warnings[0], "Warning: Keyword titel in section VantorHD/OUTPUTS/OUTPUT_1, line 6: not used");
   EXPECT_EQ(warnings[1], "Warning: Keyword flow in section VantorHD/SOURCE, line 17: not used");
+}
+
+// Sections that no reader opened: misspelt ones with the nearest name a
+// reader looked for, numbered ones beyond those read without a guess, instances
+// of a repeated section beyond those read, and keywords outside the target.
+TEST_F(SetupTest, SectionsNeverOpenedAreWarnedWithTheNearestKnownName) {
+  Open("stray = 1\n"                                        // 1
+       "[VantorHD.HYDRODYNAMIC_MODULE]\n"                   // 2
+       "mode = 2\n"                                         // 3
+       "[VantorHD.HYDRODYNAMIC_MODULE.BED_RESISTENCE]\n"    // 4
+       "type = 4\n"                                         // 5
+       "[VantorHD.HYDRODYNAMIC_MODULE.OUTPUT.OUTPUT_1]\n"   // 6
+       "file_name = \"a.zrnu\"\n"                           // 7
+       "[VantorHD.HYDRODYNAMIC_MODULE.flood_and_dry]\n"     // 8
+       "type = 1\n"                                         // 9
+       "[VantorHD.HYDRODYNAMIC_MODULE.BOUNDARY_CONDITIONS.CODE_1]\n"  // 10
+       "type = 1\n"                                         // 11
+       "[VantorHD.HYDRODYNAMIC_MODULE.BOUNDARY_CONDITIONS.CODE_7]\n"  // 12
+       "type = 1\n"                                         // 13
+       "[VantorHD.HYDRODYNAMIC_MODULE.ZZ_UNKNOWN]\n"        // 14
+       "[[VantorHD.HYDRODYNAMIC_MODULE.SOURCE]]\n"          // 15
+       "name = \"a\"\n"                                     // 16
+       "[[VantorHD.HYDRODYNAMIC_MODULE.SOURCE]]\n"          // 17
+       "name = \"b\"\n"                                     // 18
+       "[VantorHd.TIME]\n");                                // 19
+  SktOpenTarget("VantorHD");
+  SktOpenSection("HYDRODYNAMIC_MODULE", kNoIndex, nullptr, false);
+  int mode = 0;
+  SktReadKeyword("mode", mode);
+  for (const char* name : {"BED_RESISTANCE", "OUTPUTS", "FLOOD_AND_DRY", "SOURCE"}) SktSectionExists(name);
+  SktOpenSection("SOURCE", kNoIndex, nullptr, false, 1);
+  std::string text;
+  SktReadKeyword("name", text);
+  SktCloseSection();
+  SktOpenSection("BOUNDARY_CONDITIONS", kNoIndex, nullptr, false);
+  SktOpenSection("CODE", 1, nullptr, false);
+  SktReadKeyword("type", mode);
+  SktCloseSection();
+  SktSectionExists("CODE_2");
+  SktCloseSection();
+  SktCloseSection();
+  SktReportUnusedKeywords();
+  const std::vector<std::string> body = Body();
+  std::vector<std::string> warnings;
+  for (std::size_t k = 0; k < body.size(); ++k)
+    if (body[k].rfind("Warning:", 0) == 0) warnings.push_back(Unwrap(body, k, 9));
+  const std::string hd = " in section VantorHD/HYDRODYNAMIC_MODULE";
+  const std::vector<std::string> expected = {
+      "Warning: Keyword stray outside the target, line 1: not used",
+      "Warning: Section BED_RESISTENCE" + hd + ", line 4: not used; did you mean BED_RESISTANCE?",
+      "Warning: Section OUTPUT" + hd + ", line 6: not used; did you mean OUTPUTS?",
+      "Warning: Section flood_and_dry" + hd + ", line 8: not used; did you mean FLOOD_AND_DRY?",
+      "Warning: Section CODE_7" + hd + "/BOUNDARY_CONDITIONS, line 12: not used",
+      "Warning: Section ZZ_UNKNOWN" + hd + ", line 14: not used",
+      "Warning: Section SOURCE(2)" + hd + ", line 17: not used",
+      "Warning: Section VantorHd, line 19: not used; did you mean VantorHD?",
+  };
+  EXPECT_EQ(warnings, expected);
 }
 
 }  // namespace
