@@ -3,8 +3,6 @@
 #include <algorithm>
 #include <array>
 #include <cmath>
-#include <limits>
-#include <numbers>
 #include <string>
 #include <type_traits>
 
@@ -872,9 +870,8 @@ void LimitOutflowHD(HdModule& hd, HdSolver& s, const Mesh& mesh, const FaceLoopI
 
 // Element update of a stage, in vector lanes (selects, no branches):
 //   h = h_b + dt (dh/dt + s_h),
-// and for wet elements P = P_b + dt' (dP/dt + s_P) with dt' = dt times the
-// shallow-water damping sin((h - h_min) pi/2 / h_min) below 2 h_min (option
-// 1), then the semi-implicit drag; elements that are not wet take the plain
+// and for wet elements P = P_b + dt (dP/dt + s_P), then the semi-implicit
+// drag and the thin-water velocity; elements that are not wet take the plain
 // update (their face terms carry only what water brings in). kFirst: the
 // base state is the current one (kept in h_old, P_old, Q_old unless kLast);
 // else it is h_old, P_old, Q_old. The depth is cut at 0 after every stage but
@@ -892,11 +889,8 @@ void UpdateElementsHD(HdModule& hd, const HdSolver& s, const Mesh& mesh, int ne,
   const double *sum_h = s.sum_h.data(), *sum_P = s.sum_P.data(), *sum_Q = s.sum_Q.data();
   double *h = st.h.data(), *eta = st.eta.data(), *P = st.P.data(), *Q = st.Q.data();
   double *h_old = st.h_old.data(), *P_old = st.P_old.data(), *Q_old = st.Q_old.data();
-  const double h_min = hd.flood_dry.mass_depth;
-  // Depth below which the update is damped (none without the option).
-  const double damped_below = s.shallow_depth_option == 1 ? 2.0 * h_min : -std::numeric_limits<double>::infinity();
-  const double drag_above = std::max(h_min, 0.0);
-  constexpr double half_pi = 0.5 * std::numbers::pi;
+  const double h_vel = s.thin_water_depth;
+  const double h_vel4 = h_vel * h_vel * h_vel * h_vel;
   VHD_OMP_PARALLEL_FOR_SIMD
   for (int e = 1; e <= ne; ++e) {
     const double inv = 1.0 / area[e];
@@ -915,32 +909,30 @@ void UpdateElementsHD(HdModule& hd, const HdSolver& s, const Mesh& mesh, int ne,
     }
     double hn = hb + dt * (dhdt + (kSources ? src_h[e] : 0.0));
 
-    // Wet: damped explicit update, then the semi-implicit drag r = cf |u| / h
-    // with the velocity of the stage state over the new depth and (on
-    // request) once more with the velocity of the result.
-    const double damp =
-        hn >= damped_below ? 1.0 : hn > h_min ? QuarterWaveSine((hn - h_min) * half_pi / h_min) : 0.0;
-    const double dts = dt * damp;
-    const double Ps = Pb + dts * (dPdt + (kSources ? src_P[e] : 0.0));
-    const double Qs = Qb + dts * (dQdt + (kSources ? src_Q[e] : 0.0));
+    // Wet: explicit update, then the semi-implicit drag r = cf |u| / h with
+    // the velocity of the stage state over the new depth and (on request)
+    // once more with the velocity of the result, at every depth (friction
+    // acts on all water that moves; the implicit form keeps thin water
+    // stable). Thin water below h_vel then carries the desingularised
+    // velocity u = sqrt(2) h P / sqrt(h^4 + h_vel^4) (P = h u), which is
+    // below P / h and tends to zero with the depth: a film whose momentum
+    // the fluxes left out of step with its depth is not flung out.
+    const double Ps = Pb + dt * (dPdt + (kSources ? src_P[e] : 0.0));
+    const double Qs = Qb + dt * (dQdt + (kSources ? src_Q[e] : 0.0));
     const double cf = cf_bed[e] + cf_surface[e];
-    const double ih = 1.0 / hn;
+    const bool deep = hn > 0;
+    const double ih = deep ? 1.0 / hn : 0.0;
     double u = Pe * ih, v = Qe * ih;
-    double damped = 1.0 / (1.0 + dts * cf * std::sqrt(u * u + v * v) * ih);
+    double damped = 1.0 / (1.0 + dt * cf * std::sqrt(u * u + v * v) * ih);
     if constexpr (kIterate) {
       u = Ps * damped * ih, v = Qs * damped * ih;
-      damped = 1.0 / (1.0 + dts * cf * std::sqrt(u * u + v * v) * ih);
+      damped = 1.0 / (1.0 + dt * cf * std::sqrt(u * u + v * v) * ih);
     }
-    const double drag = cf > 0 ? damped : 1.0;
-    double Pw = hn > drag_above ? Ps * drag : Ps;
-    double Qw = hn > drag_above ? Qs * drag : Qs;
-    // Not accelerated below h_min: the element keeps the velocity of the base
-    // state and its momentum follows its depth (a momentum held while the
-    // water drains away would fling it out ever faster).
-    const double scale = std::max(0.0, hn) / hb;
-    const double hold = damp == 0.0 ? hb : 0.0;
-    Pw = hold > 0 ? Pb * scale : Pw;
-    Qw = hold > 0 ? Qb * scale : Qw;
+    const double h2 = hn * hn;
+    const double thin = hn < h_vel ? std::sqrt(2.0) * h2 / std::sqrt(h2 * h2 + h_vel4) : 1.0;
+    const double factor = deep ? (cf > 0 ? damped : 1.0) * thin : 0.0;
+    const double Pw = Ps * factor;
+    const double Qw = Qs * factor;
 
     const bool wet = code[e] == kWet;
     const double Pn = wet ? Pw : Pb + dt * dPdt;
@@ -1053,7 +1045,7 @@ void SetupSolverHD(HdModule& hd, const Mesh& mesh, HdSolver& s) {
     s.filter_weight.assign(ne);
     for (int e = 1; e <= ne; ++e) s.filter_weight[e] = E.area[e];
   }
-  s.shallow_depth_option = hd.flood_dry.type;
+  s.thin_water_depth = hd.flood_dry.type > 0 ? 2.0 * hd.flood_dry.drying_depth : 0.0;
 }
 
 void BoundaryFaceTerms(const HdModule& hd, HdSolver& s, const Mesh& mesh, const BoundaryFaceRecord& rec) {
