@@ -17,7 +17,10 @@
 //
 // Solver types (type_of_Riemann_solver):
 //   0 central flux, no dissipation
-//   1 Roe with optional entropy fix; central flux when h_L + h_R <= h_min
+//   1 Roe with optional entropy fix; the HLL flux (type 2) when a side is
+//     dry or h_L + h_R <= h_min: the central flux there has no dissipation,
+//     and at thin fronts on steep slopes it flung films out at hundreds of
+//     m/s; the Roe flux has no dry-front speed
 //   2 HLL with two-rarefaction wave-speed estimates (Toro)
 //   3 HLLC with Roe-averaged wave speeds and a contact wave carrying the
 //     tangential momentum
@@ -64,7 +67,7 @@ struct RiemannFlux {
 //   nx, ny      face normal pointing from L to R (unit length on Cartesian
 //               meshes)
 //   h_min       minimum depth of the flux computation (m); the Roe solver
-//               returns the central flux when h_L + h_R <= h_min
+//               takes the HLL flux when h_L + h_R <= h_min
 //   solver      type 0..4 (above); other values give the central flux
 //   entropy_fix 0 none, 1 Harten-Hyman type fix of the Roe eigenvalues
 //   length      face length (m); multiplies every output except Fh
@@ -274,7 +277,7 @@ inline FrameFlux HllcMeanPressureFlux(const SideFrame& L, const SideFrame& R) {
   FrameFlux f;
   switch (solver) {
     case 1:
-      f = SelectFlux(L.h + R.h <= h_min, CentralFlux(fl, fr), RoeFlux(fl, fr, entropy_fix, g));
+      f = SelectFlux(L.h + R.h <= h_min || fl.dry || fr.dry, HllFlux(fl, fr), RoeFlux(fl, fr, entropy_fix, g));
       break;
     case 2: f = HllFlux(fl, fr); break;
     case 3: f = HllcFlux(fl, fr, g); break;

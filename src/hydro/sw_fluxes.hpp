@@ -43,8 +43,9 @@
 //   - a face that falls back to first order next to a nearly dry side keeps
 //     the centre values, d and h of that side only: the deeper side passes
 //     its centre eta and velocity with its depth at the face from d_f;
-//   - a wet element below h_min (damping option 1) keeps the velocity of the
-//     base state, its momentum following its depth;
+//   - a wet element takes its face terms and its drag at every depth (no
+//     damping of the update in shallow water); below thin_water_depth it
+//     carries the desingularised velocity sqrt(2) h P / sqrt(h^4 + h_v^4);
 //   - the element depth correction k is zero (no depth correction is active);
 //   - the bed-slope term is g X d n len for both components (the extra
 //     g X^2/2 n_y len of the y form sums to zero over a closed element),
@@ -67,7 +68,6 @@
 //     c = filtering_coefficient and u_mean the area-weighted mean of the
 //     element and its qualifying face neighbours.
 
-#include <array>
 
 #include "core/array1.hpp"
 #include "hydro/hd_module.hpp"
@@ -165,11 +165,10 @@ struct HdSolver {
   // (allocated when the filter is on).
   Array1<double> filter_weight, filter_u, filter_v;
 
-  // Shallow-water damping option of the element update: 0 none; 1 momentum
-  // update damped by sin((h - h_min) pi/2 / h_min) below 2 h_min; > 0 scales
-  // the wind-type forcings by h^2 / (4 h_min^2) below 2 h_min. Set from the
-  // flood-and-dry type at setup.
-  int shallow_depth_option = 0;
+  // Depth below which a wet element carries the desingularised velocity of
+  // the element update (twice the drying depth; 0 without flooding and
+  // drying).
+  double thin_water_depth = 0.0;
   // 1 when the gravity-wave term is not part of the explicit step (CFL rate
   // without 2 sqrt(g h)); 0 for the explicit shallow-water equations.
   int implicit_gravity = 0;
@@ -229,26 +228,6 @@ inline bool RiemannFaceCase(int cL, int cR, double etaL, double dL, double etaR,
   if (cL == kWet && cR == kFlooded) return second || etaL + dR > 0;
   if (cL == kFlooded && cR == kWet) return second || dL + etaR > 0;
   return false;
-}
-
-// sin(x) for 0 <= x <= pi/2 from its Taylor series (terms to x^21: the
-// first one left out is below 2e-18), to within an ulp or two of std::sin;
-// unlike std::sin it runs in vector lanes.
-[[gnu::always_inline]] inline double QuarterWaveSine(double x) {
-  constexpr int kTerms = 11;
-  constexpr auto coefficients = [] {
-    std::array<double, kTerms> c{};
-    double term = 1.0;  // (-1)^k / (2k+1)!
-    for (int k = 0; k < kTerms; ++k) {
-      c[k] = term;
-      term = -term / ((2.0 * k + 2.0) * (2.0 * k + 3.0));
-    }
-    return c;
-  }();
-  const double x2 = x * x;
-  double sum = coefficients[kTerms - 1];
-  for (int k = kTerms - 2; k >= 0; --k) sum = coefficients[k] + x2 * sum;
-  return x * sum;
 }
 
 // Momentum terms of face f for both sides (its mass flux goes into

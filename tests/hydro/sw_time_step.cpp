@@ -6,7 +6,6 @@
 
 #include <cmath>
 #include <cstring>
-#include <numbers>
 #include <vector>
 
 #include "sw_case.hpp"
@@ -71,18 +70,6 @@ TEST(SwTimeStep, CflCorrectionLimitsTheSpeed) {
   ASSERT_GT(a, 0);
   EXPECT_NEAR(std::abs(st.P[1]) + std::abs(st.Q[1]), a, 1e-12);
   EXPECT_NEAR(st.P[1] / st.Q[1], -3.0, 1e-12);
-}
-
-// The sine of the shallow-water damping, formed in vector lanes, is the
-// library's sine to within two ulps over its whole range.
-TEST(SwTimeStep, DampingSineIsTheSine) {
-  double worst = 0.0;
-  for (int i = 0; i <= 10000; ++i) {
-    const double x = 0.5 * std::numbers::pi * i / 10000.0;
-    worst = std::max(worst, std::abs(QuarterWaveSine(x) - std::sin(x)));
-  }
-  EXPECT_LE(worst, 2.3e-16);
-  EXPECT_EQ(QuarterWaveSine(0.0), 0.0);
 }
 
 // A closed basin with a sloshing surface, flooding and drying on over a
