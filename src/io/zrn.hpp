@@ -224,6 +224,7 @@ struct ZrnFile {
   std::string detail;       // the library's own message for the last failure
   std::vector<int> item_varid, static_varid;
   std::vector<double> fill, missing, scale, offset;  // per dynamic item (reading)
+  std::vector<double> record;  // one dynamic record as stored (writing; sized when opened)
   int time_varid = -1;
 };
 

@@ -212,5 +212,68 @@ print("ok")
   EXPECT_EQ(RunPython(dir, script, name, out), 0) << out;
 }
 
+// QGIS's mesh reader pairs variables whose long_name reads like one part of a
+// vector ("Current direction" with a "Current ... magnitude") and refuses the
+// file when the partner is missing. Mesh items with such names carry their
+// name in zrn_item_name only; every item still reads back by its name.
+TEST(ZrnInterop, MeshItemsNamedLikeVectorPartsHaveNoLongName) {
+  struct Case {
+    const char* name;
+    bool long_name;
+  };
+  const std::vector<Case> cases = {
+      {"Surface elevation", true},     {"Current speed", true},
+      {"U velocity", true},            {"Current direction", false},
+      {"Wind Direction", false},       {"Velocity magnitude", false},
+      {"Flux, x-component", false},    {"Flux, y-component", false},
+      {"u component of wind", false},  {"V component of wind", false},
+  };
+  test::TempDir dir;
+  const std::string name = dir.file("names.zrnu");
+  const ZrnMeshData m = test::MakeZrnMesh({0, 1, 1, 0}, {0, 0, 1, 1}, 0.0, 0.0, {{1, 2, 3, 4}});
+  ZrnFile f;
+  zrnHeaderCreate(f, name, kZrnFileMesh2D, "names");
+  ASSERT_EQ(zrnSetMesh(f, m), 0);
+  zrnSetEqCalendarAxis(f, ZrnDateTime{2004, 1, 1, 0, 0, 0}, 60.0);
+  for (std::size_t k = 0; k < cases.size(); ++k) {
+    const int item = static_cast<int>(k + 1);
+    zrnSetItemInfo(f, item, cases[k].name, kUvqItemUndefined, kUvqUnonDim);
+    zrnSetItemAxisEqD4(f, item, kZrnLocationFace, 1);
+  }
+  ASSERT_EQ(zrnFileCreate(f), 0);
+  zrnFileClose(f);
+
+  int ncid = -1;
+  ASSERT_EQ(nc_open(name.c_str(), NC_NOWRITE, &ncid), NC_NOERR);
+  int nvars = 0;
+  nc_inq_nvars(ncid, &nvars);
+  std::vector<std::string> with_long_name;
+  for (int v = 0; v < nvars; ++v) {
+    size_t len = 0;
+    if (nc_inq_attlen(ncid, v, "zrn_item_name", &len) != NC_NOERR) continue;
+    std::string item(len, '\0');
+    nc_get_att_text(ncid, v, "zrn_item_name", item.data());
+    if (nc_inq_attlen(ncid, v, "long_name", &len) == NC_NOERR) with_long_name.push_back(item);
+  }
+  nc_close(ncid);
+  std::vector<std::string> want_long_name;
+  for (const Case& c : cases)
+    if (c.long_name) want_long_name.emplace_back(c.name);
+  EXPECT_EQ(with_long_name, want_long_name);
+
+  ZrnFile r;
+  ASSERT_EQ(zrnFileRead(r, name), 0);
+  int nitems = 0;
+  zrnGetNoOfItems(r, nitems);
+  ASSERT_EQ(nitems, static_cast<int>(cases.size()));
+  for (int k = 1; k <= nitems; ++k) {
+    std::string item;
+    int type = 0, unit = 0, value_type = 0;
+    zrnGetItemInfo(r, k, item, type, unit, value_type);
+    EXPECT_EQ(item, cases[static_cast<std::size_t>(k - 1)].name);
+  }
+  zrnFileClose(r);
+}
+
 }  // namespace
 }  // namespace vhd
