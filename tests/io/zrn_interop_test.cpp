@@ -5,6 +5,7 @@
 #include <gtest/gtest.h>
 #include <netcdf.h>
 
+#include <cmath>
 #include <cstdlib>
 #include <filesystem>
 #include <string>
@@ -210,6 +211,58 @@ print("ok")
 )";
   std::string out;
   EXPECT_EQ(RunPython(dir, script, name, out), 0) << out;
+}
+
+// No data is stored as NaN with a NaN _FillValue: QGIS's mesh reader takes
+// every value within 2.2e-16 of the fill value for no data, so the default
+// delete value 1e-35 as fill blanked every zero. Zero and values near the
+// delete value stay what they are; our reader gives the delete value back.
+TEST(ZrnInterop, NoDataIsStoredAsNaNAndZeroStaysZero) {
+  const double del = kZrnDefaultDeleteValue;
+  const std::vector<double> written = {0.0, del, 2.5, -1e-20};
+  for (const int precision : {kZrnFloat, kZrnDouble}) {
+    SCOPED_TRACE(precision == kZrnFloat ? "float" : "double");
+    test::TempDir dir;
+    const std::string name = dir.file("nodata.zrnu");
+    ZrnFile f;
+    zrnHeaderCreate(f, name, kZrnFileMesh2D, "no data");
+    ASSERT_EQ(zrnSetMesh(f, test::MakeZrnMesh({0, 1, 1, 0}, {0, 0, 1, 1}, 0.0, 0.0, {{1, 2, 3}, {1, 3, 4}})), 0);
+    zrnSetEqCalendarAxis(f, ZrnDateTime{2004, 1, 1, 0, 0, 0}, 60.0);
+    zrnSetItemInfo(f, 1, "Surface elevation", kUvqIWaterLevel, kUvqUmeter, precision);
+    zrnSetItemAxisEqD4(f, 1, kZrnLocationNode, 4);
+    ASSERT_EQ(zrnFileCreate(f), 0);
+    if (precision == kZrnFloat) {
+      const std::vector<float> v(written.begin(), written.end());
+      ASSERT_EQ(zrnWriteItemTimeStep(f, 0, v.data(), 4), 0);
+    } else {
+      ASSERT_EQ(zrnWriteItemTimeStep(f, 0, written.data(), 4), 0);
+    }
+    zrnFileClose(f);
+
+    int ncid = -1, var = -1;
+    ASSERT_EQ(nc_open(name.c_str(), NC_NOWRITE, &ncid), NC_NOERR);
+    ASSERT_EQ(nc_inq_varid(ncid, "surface_elevation", &var), NC_NOERR);
+    double fill = 0.0, stored[4];
+    nc_get_att_double(ncid, var, "_FillValue", &fill);
+    nc_get_var_double(ncid, var, stored);
+    nc_close(ncid);
+    EXPECT_TRUE(std::isnan(fill));
+    EXPECT_EQ(stored[0], 0.0);
+    EXPECT_TRUE(std::isnan(stored[1]));
+    EXPECT_EQ(stored[2], 2.5);
+    EXPECT_EQ(stored[3], precision == kZrnFloat ? static_cast<double>(-1e-20f) : -1e-20);
+
+    ZrnFile r;
+    ASSERT_EQ(zrnFileRead(r, name), 0);
+    int item = 0;
+    double time = 0.0, back[4];
+    ASSERT_EQ(zrnReadItemTimeStep(r, item, time, back, 4), 0);
+    zrnFileClose(r);
+    EXPECT_EQ(back[0], 0.0);
+    EXPECT_EQ(back[1], del);
+    EXPECT_EQ(back[2], 2.5);
+    EXPECT_EQ(back[3], stored[3]);
+  }
 }
 
 // QGIS's mesh reader pairs variables whose long_name reads like one part of a
