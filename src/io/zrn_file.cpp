@@ -232,18 +232,32 @@ bool IsDelete(double v, double delete_value, int precision) {
 // reader, which takes every value within 2.2e-16 of the fill value for no
 // data, blank every zero as well.
 template <class T>
-void StoreValues(const T* data, long n, double delete_value, int precision, double* stored) {
-  for (long i = 0; i < n; ++i) {
-    const double v = static_cast<double>(data[i]);
-    stored[i] = IsDelete(v, delete_value, precision) ? std::numeric_limits<double>::quiet_NaN() : v;
-  }
+void StoreValues(const T* data, long n, double delete_value, int precision, T* stored) {
+  for (long i = 0; i < n; ++i)
+    stored[i] = IsDelete(static_cast<double>(data[i]), delete_value, precision)
+                    ? std::numeric_limits<T>::quiet_NaN()
+                    : data[i];
 }
 
-// Sizes the record buffer of a file open for writing to its largest item.
+// Writes values of either type (no conversion, so that a float infinity
+// stays one; netCDF refuses it from a double).
+int PutValues(int ncid, int var, const size_t* start, const size_t* count, const float* v) {
+  return nc_put_vara_float(ncid, var, start, count, v);
+}
+int PutValues(int ncid, int var, const size_t* start, const size_t* count, const double* v) {
+  return nc_put_vara_double(ncid, var, start, count, v);
+}
+
+// The record buffer of the values' type.
+std::vector<float>& RecordBuffer(ZrnFile& f, const float*) { return f.record_float; }
+std::vector<double>& RecordBuffer(ZrnFile& f, const double*) { return f.record; }
+
+// Sizes the record buffers of a file open for writing to its largest item.
 void SizeRecord(ZrnFile& f) {
   long n = 0;
   for (const ZrnItemInfo& it : f.items) n = std::max(n, it.axis.Count());
   f.record.assign(static_cast<size_t>(n), 0.0);
+  f.record_float.assign(static_cast<size_t>(n), 0.0f);
 }
 
 template <class T>
@@ -1260,9 +1274,9 @@ int WriteRecord(ZrnFile& f, double time, const T* data, long n) {
   }
   size_t start[4], cnt[4];
   RecordShape(it.axis, true, step, start, cnt);
-  StoreValues(data, n, f.delete_value, it.precision, f.record.data());
-  const int nc = nc_put_vara_double(f.ncid, f.item_varid[static_cast<size_t>(item - 1)], start, cnt,
-                                    f.record.data());
+  T* stored = RecordBuffer(f, data).data();
+  StoreValues(data, n, f.delete_value, it.precision, stored);
+  const int nc = PutValues(f.ncid, f.item_varid[static_cast<size_t>(item - 1)], start, cnt, stored);
   if (nc != NC_NOERR) return Fail(f, kZrnErrWriteDynamic, nc_strerror(nc));
   AddStatistics(it, data, n, f.delete_value);
   f.dynamic_started = true;
@@ -1326,9 +1340,9 @@ int WriteStatic(ZrnFile& f, int static_no, const T* data, long n) {
                                            std::to_string(n));
   size_t start[4], cnt[4];
   RecordShape(it.axis, false, 0, start, cnt);
-  std::vector<double> stored(static_cast<size_t>(n));
+  std::vector<T> stored(static_cast<size_t>(n));
   StoreValues(data, n, f.delete_value, it.precision, stored.data());
-  const int nc = nc_put_vara_double(f.ncid, var, start, cnt, stored.data());
+  const int nc = PutValues(f.ncid, var, start, cnt, stored.data());
   if (nc != NC_NOERR) return Fail(f, kZrnErrWriteStatic, nc_strerror(nc));
   AddStatistics(it, data, n, f.delete_value);
   return kZrnOk;

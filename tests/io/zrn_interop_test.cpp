@@ -8,6 +8,7 @@
 #include <cmath>
 #include <cstdlib>
 #include <filesystem>
+#include <limits>
 #include <string>
 #include <vector>
 
@@ -218,50 +219,51 @@ print("ok")
 // delete value 1e-35 as fill blanked every zero. Zero and values near the
 // delete value stay what they are; our reader gives the delete value back.
 TEST(ZrnInterop, NoDataIsStoredAsNaNAndZeroStaysZero) {
-  const double del = kZrnDefaultDeleteValue;
-  const std::vector<double> written = {0.0, del, 2.5, -1e-20};
+  const double del = kZrnDefaultDeleteValue, inf = std::numeric_limits<double>::infinity();
+  const std::vector<double> written = {0.0, del, 2.5, -1e-20, inf, -3.0};
+  const ZrnMeshData mesh =
+      test::MakeZrnMesh({0, 1, 2, 0, 1, 2}, {0, 0, 0, 1, 1, 1}, 0.0, 0.0, {{1, 2, 5, 4}, {2, 3, 6, 5}});
   for (const int precision : {kZrnFloat, kZrnDouble}) {
     SCOPED_TRACE(precision == kZrnFloat ? "float" : "double");
     test::TempDir dir;
     const std::string name = dir.file("nodata.zrnu");
     ZrnFile f;
     zrnHeaderCreate(f, name, kZrnFileMesh2D, "no data");
-    ASSERT_EQ(zrnSetMesh(f, test::MakeZrnMesh({0, 1, 1, 0}, {0, 0, 1, 1}, 0.0, 0.0, {{1, 2, 3}, {1, 3, 4}})), 0);
+    ASSERT_EQ(zrnSetMesh(f, mesh), 0);
     zrnSetEqCalendarAxis(f, ZrnDateTime{2004, 1, 1, 0, 0, 0}, 60.0);
     zrnSetItemInfo(f, 1, "Surface elevation", kUvqIWaterLevel, kUvqUmeter, precision);
-    zrnSetItemAxisEqD4(f, 1, kZrnLocationNode, 4);
+    zrnSetItemAxisEqD4(f, 1, kZrnLocationNode, 6);
     ASSERT_EQ(zrnFileCreate(f), 0);
-    if (precision == kZrnFloat) {
-      const std::vector<float> v(written.begin(), written.end());
-      ASSERT_EQ(zrnWriteItemTimeStep(f, 0, v.data(), 4), 0);
-    } else {
-      ASSERT_EQ(zrnWriteItemTimeStep(f, 0, written.data(), 4), 0);
-    }
+    const std::vector<float> single(written.begin(), written.end());
+    ASSERT_EQ(precision == kZrnFloat ? zrnWriteItemTimeStep(f, 0, single.data(), 6)
+                                     : zrnWriteItemTimeStep(f, 0, written.data(), 6),
+              0);
     zrnFileClose(f);
+    // What the file holds: the values as written (in the item's precision), NaN for no data.
+    std::vector<double> want(written.begin(), written.end());
+    if (precision == kZrnFloat) want.assign(single.begin(), single.end());
 
     int ncid = -1, var = -1;
     ASSERT_EQ(nc_open(name.c_str(), NC_NOWRITE, &ncid), NC_NOERR);
     ASSERT_EQ(nc_inq_varid(ncid, "surface_elevation", &var), NC_NOERR);
-    double fill = 0.0, stored[4];
+    double fill = 0.0, stored[6];
     nc_get_att_double(ncid, var, "_FillValue", &fill);
     nc_get_var_double(ncid, var, stored);
     nc_close(ncid);
     EXPECT_TRUE(std::isnan(fill));
-    EXPECT_EQ(stored[0], 0.0);
-    EXPECT_TRUE(std::isnan(stored[1]));
-    EXPECT_EQ(stored[2], 2.5);
-    EXPECT_EQ(stored[3], precision == kZrnFloat ? static_cast<double>(-1e-20f) : -1e-20);
+    for (int i = 0; i < 6; ++i) {
+      if (i == 1) EXPECT_TRUE(std::isnan(stored[i]));
+      else EXPECT_EQ(stored[i], want[static_cast<std::size_t>(i)]) << i;
+    }
 
     ZrnFile r;
     ASSERT_EQ(zrnFileRead(r, name), 0);
     int item = 0;
-    double time = 0.0, back[4];
-    ASSERT_EQ(zrnReadItemTimeStep(r, item, time, back, 4), 0);
+    double time = 0.0, back[6];
+    ASSERT_EQ(zrnReadItemTimeStep(r, item, time, back, 6), 0);
     zrnFileClose(r);
-    EXPECT_EQ(back[0], 0.0);
-    EXPECT_EQ(back[1], del);
-    EXPECT_EQ(back[2], 2.5);
-    EXPECT_EQ(back[3], stored[3]);
+    want[1] = del;
+    for (int i = 0; i < 6; ++i) EXPECT_EQ(back[i], want[static_cast<std::size_t>(i)]) << i;
   }
 }
 
