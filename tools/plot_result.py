@@ -10,7 +10,8 @@ A .zrnu file gives a map of one element item on the mesh's triangles and
 quadrilaterals, at a step (from 0; negative counts from the end, default the
 last) or as its maximum over all steps. A .zrn0 file gives time series of its
 items (all, or those named with --item), one panel per unit. Items are named
-by their item name (the variable's long_name) or their variable name. Delete
+by their item name (the variable's zrn_item_name, else its long_name) or
+their variable name. Delete
 values are left blank. Writes a PNG.
 """
 
@@ -43,12 +44,16 @@ def item_variables(nc, spatial_dim=None):
     return [name for _, name in sorted(items)]
 
 
+def item_name(var):
+    """The item name: a mesh item named like a vector part has no long_name."""
+    return getattr(var, "zrn_item_name", getattr(var, "long_name", var.name))
+
+
 def find_item(nc, wanted, candidates):
     for name in candidates:
-        var = nc.variables[name]
-        if wanted == name or wanted == getattr(var, "long_name", None):
+        if wanted in (name, item_name(nc.variables[name])):
             return name
-    titles = ", ".join('"%s"' % getattr(nc.variables[n], "long_name", n) for n in candidates)
+    titles = ", ".join('"%s"' % item_name(nc.variables[n]) for n in candidates)
     fail('no item "%s" in %s; items: %s' % (wanted, nc.filepath(), titles))
 
 
@@ -71,7 +76,7 @@ def times(nc):
 
 
 def label(var):
-    name = getattr(var, "long_name", var.name)
+    name = item_name(var)
     units = getattr(var, "units", "")
     return "%s (%s)" % (name, units) if units else name
 
@@ -99,13 +104,13 @@ def plot_map(nc, args):
     when = times(nc)
     if args.max:
         values = masked(nc, var[:]).max(axis=0)
-        title = "Maximum of %s, %s to %s" % (var.long_name, when[0], when[-1])
+        title = "Maximum of %s, %s to %s" % (item_name(var), when[0], when[-1])
     else:
         step = args.step if args.step is not None else -1
         if not -nsteps <= step < nsteps:
             fail("step %d is not in the file (steps 0 to %d)" % (step, nsteps - 1))
         values = masked(nc, var[step, :])
-        title = "%s at %s" % (var.long_name, when[step])
+        title = "%s at %s" % (item_name(var), when[step])
 
     polygons = [np.column_stack((x[row[row >= start] - start], y[row[row >= start] - start])) for row in conn]
     fig, ax = plt.subplots(figsize=(9, 7))
@@ -140,7 +145,7 @@ def plot_series(nc, args):
             var = nc.variables[name]
             if getattr(var, "units", "") == unit:
                 panel.plot(when, masked(nc, var[:]), marker="." if len(when) < 50 else None,
-                           label=getattr(var, "long_name", name))
+                           label=item_name(var))
         panel.set_ylabel(unit)
         panel.grid(True, alpha=0.3)
         panel.legend(fontsize="small")

@@ -224,6 +224,9 @@ struct ZrnFile {
   std::string detail;       // the library's own message for the last failure
   std::vector<int> item_varid, static_varid;
   std::vector<double> fill, missing, scale, offset;  // per dynamic item (reading)
+  // One dynamic record as stored, for either type of values (writing; sized when opened).
+  std::vector<double> record;
+  std::vector<float> record_float;
   int time_varid = -1;
 };
 

@@ -13,7 +13,6 @@
 #include <cstring>
 #include <limits>
 #include <set>
-#include <type_traits>
 #include <utility>
 
 #include "io/units.hpp"
@@ -148,6 +147,19 @@ std::string VariableName(int ncid, const std::string& item_name) {
   return name;
 }
 
+// Whether a mesh reader would take a variable with this long_name for one
+// part of a vector (x or y component, magnitude or direction) and look for
+// the other part in the file: QGIS's mesh reader does, matching these words
+// in the long_name, and refuses the whole file when the partner is missing.
+bool LooksLikeVectorPart(const std::string& long_name) {
+  static const char* const kParts[] = {", x-component", ", y-component", "u component of ",
+                                       "v component of ", " magnitude", "direction"};
+  const std::string name = Lower(long_name);
+  for (const char* part : kParts)
+    if (name.find(part) != std::string::npos) return true;
+  return false;
+}
+
 bool IsLongLat(const std::string& projection) {
   const std::string p = Lower(projection);
   return p == "long/lat" || p == "lat/long" || p == "longlat";
@@ -213,6 +225,39 @@ bool IsDelete(double v, double delete_value, int precision) {
   if (std::isnan(v)) return true;
   if (precision == kZrnFloat) return static_cast<float>(v) == static_cast<float>(delete_value);
   return v == delete_value;
+}
+
+// Values as a file stores them: no data as NaN, the fill value. A delete
+// value near zero (the default 1e-35) stored as such would make QGIS's mesh
+// reader, which takes every value within 2.2e-16 of the fill value for no
+// data, blank every zero as well.
+template <class T>
+void StoreValues(const T* data, long n, double delete_value, int precision, T* stored) {
+  for (long i = 0; i < n; ++i)
+    stored[i] = IsDelete(static_cast<double>(data[i]), delete_value, precision)
+                    ? std::numeric_limits<T>::quiet_NaN()
+                    : data[i];
+}
+
+// Writes values of either type (no conversion, so that a float infinity
+// stays one; netCDF refuses it from a double).
+int PutValues(int ncid, int var, const size_t* start, const size_t* count, const float* v) {
+  return nc_put_vara_float(ncid, var, start, count, v);
+}
+int PutValues(int ncid, int var, const size_t* start, const size_t* count, const double* v) {
+  return nc_put_vara_double(ncid, var, start, count, v);
+}
+
+// The record buffer of the values' type.
+std::vector<float>& RecordBuffer(ZrnFile& f, const float*) { return f.record_float; }
+std::vector<double>& RecordBuffer(ZrnFile& f, const double*) { return f.record; }
+
+// Sizes the record buffers of a file open for writing to its largest item.
+void SizeRecord(ZrnFile& f) {
+  long n = 0;
+  for (const ZrnItemInfo& it : f.items) n = std::max(n, it.axis.Count());
+  f.record.assign(static_cast<size_t>(n), 0.0);
+  f.record_float.assign(static_cast<size_t>(n), 0.0f);
 }
 
 template <class T>
@@ -335,13 +380,20 @@ int DefineItemVariable(ZrnFile& f, SpatialDims& d, int time_dim, ZrnItemInfo& it
   Check(nc_def_var(ncid, it.var_name.c_str(), type, nd, dims, &var), "variable " + it.var_name);
   if (it.compression > 0 && nd > 0)
     Check(nc_def_var_deflate(ncid, var, 1, 1, it.compression), "compression of " + it.var_name);
+  // No data is stored as NaN (see StoreValues); the delete value itself is the
+  // global zrn_delete_value.
   if (type == NC_FLOAT) {
-    const float fill = static_cast<float>(f.delete_value);
+    const float fill = std::numeric_limits<float>::quiet_NaN();
     Check(nc_put_att_float(ncid, var, "_FillValue", NC_FLOAT, 1, &fill), "fill value");
   } else {
-    Check(nc_put_att_double(ncid, var, "_FillValue", NC_DOUBLE, 1, &f.delete_value), "fill value");
+    const double fill = std::numeric_limits<double>::quiet_NaN();
+    Check(nc_put_att_double(ncid, var, "_FillValue", NC_DOUBLE, 1, &fill), "fill value");
   }
-  PutText(ncid, var, "long_name", it.name);
+  // A mesh item named like a vector part keeps its name in zrn_item_name only,
+  // so that every item opens as a dataset of its own.
+  PutText(ncid, var, "zrn_item_name", it.name);
+  if (it.axis.type != kZrnAxisD4 || !LooksLikeVectorPart(it.name))
+    PutText(ncid, var, "long_name", it.name);
   const std::string units = uvqGetUnitUdunits(it.unit);
   if (!units.empty()) PutText(ncid, var, "units", units);
   PutInt(ncid, var, timed ? "zrn_item" : "zrn_static", number);
@@ -680,6 +732,7 @@ int CreateFile(ZrnFile& f) {
     return Fail(f, kZrnErrCreateFile, e.what);
   }
   f.mesh = ZrnMeshData{};
+  SizeRecord(f);
   f.creator = kSource;
   f.header_ready = true;
   f.can_write = true;
@@ -875,7 +928,9 @@ ZrnItemInfo ItemOfVariable(const ZrnFile& f, const VarInfo& v, std::size_t first
   const int ncid = f.ncid;
   ZrnItemInfo it;
   it.var_name = v.name;
-  if (!GetText(ncid, v.id, "long_name", it.name) || it.name.empty()) it.name = v.name;
+  if ((!GetText(ncid, v.id, "zrn_item_name", it.name) || it.name.empty()) &&
+      (!GetText(ncid, v.id, "long_name", it.name) || it.name.empty()))
+    it.name = v.name;
   std::string units, standard_name;
   GetText(ncid, v.id, "units", units);
   GetText(ncid, v.id, "standard_name", standard_name);
@@ -1219,11 +1274,9 @@ int WriteRecord(ZrnFile& f, double time, const T* data, long n) {
   }
   size_t start[4], cnt[4];
   RecordShape(it.axis, true, step, start, cnt);
-  int nc;
-  if constexpr (std::is_same_v<T, float>)
-    nc = nc_put_vara_float(f.ncid, f.item_varid[static_cast<size_t>(item - 1)], start, cnt, data);
-  else
-    nc = nc_put_vara_double(f.ncid, f.item_varid[static_cast<size_t>(item - 1)], start, cnt, data);
+  T* stored = RecordBuffer(f, data).data();
+  StoreValues(data, n, f.delete_value, it.precision, stored);
+  const int nc = PutValues(f.ncid, f.item_varid[static_cast<size_t>(item - 1)], start, cnt, stored);
   if (nc != NC_NOERR) return Fail(f, kZrnErrWriteDynamic, nc_strerror(nc));
   AddStatistics(it, data, n, f.delete_value);
   f.dynamic_started = true;
@@ -1287,9 +1340,9 @@ int WriteStatic(ZrnFile& f, int static_no, const T* data, long n) {
                                            std::to_string(n));
   size_t start[4], cnt[4];
   RecordShape(it.axis, false, 0, start, cnt);
-  int nc;
-  if constexpr (std::is_same_v<T, float>) nc = nc_put_vara_float(f.ncid, var, start, cnt, data);
-  else nc = nc_put_vara_double(f.ncid, var, start, cnt, data);
+  std::vector<T> stored(static_cast<size_t>(n));
+  StoreValues(data, n, f.delete_value, it.precision, stored.data());
+  const int nc = PutValues(f.ncid, var, start, cnt, stored.data());
   if (nc != NC_NOERR) return Fail(f, kZrnErrWriteStatic, nc_strerror(nc));
   AddStatistics(it, data, n, f.delete_value);
   return kZrnOk;
@@ -1321,6 +1374,7 @@ int zrnFileAppend(ZrnFile& f, const std::string& file_name, bool flush_each_step
       code = Fail(f, kZrnErrTimeAxis, "file has no time axis to append to");
     } else {
       f.writing = true;
+      SizeRecord(f);
       f.flush_each_step = flush_each_step;
       f.current_step = f.time.nsteps;
       if (f.time.nsteps > 0) {

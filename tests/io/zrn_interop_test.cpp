@@ -5,8 +5,10 @@
 #include <gtest/gtest.h>
 #include <netcdf.h>
 
+#include <cmath>
 #include <cstdlib>
 #include <filesystem>
+#include <limits>
 #include <string>
 #include <vector>
 
@@ -210,6 +212,122 @@ print("ok")
 )";
   std::string out;
   EXPECT_EQ(RunPython(dir, script, name, out), 0) << out;
+}
+
+// No data is stored as NaN with a NaN _FillValue: QGIS's mesh reader takes
+// every value within 2.2e-16 of the fill value for no data, so the default
+// delete value 1e-35 as fill blanked every zero. Zero and values near the
+// delete value stay what they are; our reader gives the delete value back.
+TEST(ZrnInterop, NoDataIsStoredAsNaNAndZeroStaysZero) {
+  const double del = kZrnDefaultDeleteValue, inf = std::numeric_limits<double>::infinity();
+  const std::vector<double> written = {0.0, del, 2.5, -1e-20, inf, -3.0};
+  const ZrnMeshData mesh =
+      test::MakeZrnMesh({0, 1, 2, 0, 1, 2}, {0, 0, 0, 1, 1, 1}, 0.0, 0.0, {{1, 2, 5, 4}, {2, 3, 6, 5}});
+  for (const int precision : {kZrnFloat, kZrnDouble}) {
+    SCOPED_TRACE(precision == kZrnFloat ? "float" : "double");
+    test::TempDir dir;
+    const std::string name = dir.file("nodata.zrnu");
+    ZrnFile f;
+    zrnHeaderCreate(f, name, kZrnFileMesh2D, "no data");
+    ASSERT_EQ(zrnSetMesh(f, mesh), 0);
+    zrnSetEqCalendarAxis(f, ZrnDateTime{2004, 1, 1, 0, 0, 0}, 60.0);
+    zrnSetItemInfo(f, 1, "Surface elevation", kUvqIWaterLevel, kUvqUmeter, precision);
+    zrnSetItemAxisEqD4(f, 1, kZrnLocationNode, 6);
+    ASSERT_EQ(zrnFileCreate(f), 0);
+    const std::vector<float> single(written.begin(), written.end());
+    ASSERT_EQ(precision == kZrnFloat ? zrnWriteItemTimeStep(f, 0, single.data(), 6)
+                                     : zrnWriteItemTimeStep(f, 0, written.data(), 6),
+              0);
+    zrnFileClose(f);
+    // What the file holds: the values as written (in the item's precision), NaN for no data.
+    std::vector<double> want(written.begin(), written.end());
+    if (precision == kZrnFloat) want.assign(single.begin(), single.end());
+
+    int ncid = -1, var = -1;
+    ASSERT_EQ(nc_open(name.c_str(), NC_NOWRITE, &ncid), NC_NOERR);
+    ASSERT_EQ(nc_inq_varid(ncid, "surface_elevation", &var), NC_NOERR);
+    double fill = 0.0, stored[6];
+    nc_get_att_double(ncid, var, "_FillValue", &fill);
+    nc_get_var_double(ncid, var, stored);
+    nc_close(ncid);
+    EXPECT_TRUE(std::isnan(fill));
+    for (int i = 0; i < 6; ++i) {
+      if (i == 1) EXPECT_TRUE(std::isnan(stored[i]));
+      else EXPECT_EQ(stored[i], want[static_cast<std::size_t>(i)]) << i;
+    }
+
+    ZrnFile r;
+    ASSERT_EQ(zrnFileRead(r, name), 0);
+    int item = 0;
+    double time = 0.0, back[6];
+    ASSERT_EQ(zrnReadItemTimeStep(r, item, time, back, 6), 0);
+    zrnFileClose(r);
+    want[1] = del;
+    for (int i = 0; i < 6; ++i) EXPECT_EQ(back[i], want[static_cast<std::size_t>(i)]) << i;
+  }
+}
+
+// QGIS's mesh reader pairs variables whose long_name reads like one part of a
+// vector ("Current direction" with a "Current ... magnitude") and refuses the
+// file when the partner is missing. Mesh items with such names carry their
+// name in zrn_item_name only; every item still reads back by its name.
+TEST(ZrnInterop, MeshItemsNamedLikeVectorPartsHaveNoLongName) {
+  struct Case {
+    const char* name;
+    bool long_name;
+  };
+  const std::vector<Case> cases = {
+      {"Surface elevation", true},     {"Current speed", true},
+      {"U velocity", true},            {"Current direction", false},
+      {"Wind Direction", false},       {"Velocity magnitude", false},
+      {"Flux, x-component", false},    {"Flux, y-component", false},
+      {"u component of wind", false},  {"V component of wind", false},
+  };
+  test::TempDir dir;
+  const std::string name = dir.file("names.zrnu");
+  const ZrnMeshData m = test::MakeZrnMesh({0, 1, 1, 0}, {0, 0, 1, 1}, 0.0, 0.0, {{1, 2, 3, 4}});
+  ZrnFile f;
+  zrnHeaderCreate(f, name, kZrnFileMesh2D, "names");
+  ASSERT_EQ(zrnSetMesh(f, m), 0);
+  zrnSetEqCalendarAxis(f, ZrnDateTime{2004, 1, 1, 0, 0, 0}, 60.0);
+  for (std::size_t k = 0; k < cases.size(); ++k) {
+    const int item = static_cast<int>(k + 1);
+    zrnSetItemInfo(f, item, cases[k].name, kUvqItemUndefined, kUvqUnonDim);
+    zrnSetItemAxisEqD4(f, item, kZrnLocationFace, 1);
+  }
+  ASSERT_EQ(zrnFileCreate(f), 0);
+  zrnFileClose(f);
+
+  int ncid = -1;
+  ASSERT_EQ(nc_open(name.c_str(), NC_NOWRITE, &ncid), NC_NOERR);
+  int nvars = 0;
+  nc_inq_nvars(ncid, &nvars);
+  std::vector<std::string> with_long_name;
+  for (int v = 0; v < nvars; ++v) {
+    size_t len = 0;
+    if (nc_inq_attlen(ncid, v, "zrn_item_name", &len) != NC_NOERR) continue;
+    std::string item(len, '\0');
+    nc_get_att_text(ncid, v, "zrn_item_name", item.data());
+    if (nc_inq_attlen(ncid, v, "long_name", &len) == NC_NOERR) with_long_name.push_back(item);
+  }
+  nc_close(ncid);
+  std::vector<std::string> want_long_name;
+  for (const Case& c : cases)
+    if (c.long_name) want_long_name.emplace_back(c.name);
+  EXPECT_EQ(with_long_name, want_long_name);
+
+  ZrnFile r;
+  ASSERT_EQ(zrnFileRead(r, name), 0);
+  int nitems = 0;
+  zrnGetNoOfItems(r, nitems);
+  ASSERT_EQ(nitems, static_cast<int>(cases.size()));
+  for (int k = 1; k <= nitems; ++k) {
+    std::string item;
+    int type = 0, unit = 0, value_type = 0;
+    zrnGetItemInfo(r, k, item, type, unit, value_type);
+    EXPECT_EQ(item, cases[static_cast<std::size_t>(k - 1)].name);
+  }
+  zrnFileClose(r);
 }
 
 }  // namespace
