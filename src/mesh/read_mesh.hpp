@@ -65,8 +65,18 @@ void ReadMesh(Mesh& mesh);
 // The same without the setup file: the reader by extension and the completion.
 void ReadMeshFile(Mesh& mesh, const std::string& file_name, const GridMeshOptions& grid = {},
                   int check_mesh = 1);
-// Only the reader chosen by the extension (coordinates as in the file).
+// Only the reader chosen by the extension (coordinates as in the file),
+// followed by CheckMeshGeometry; running out of memory while reading is the
+// fatal error "ReadMesh: Out of memory (file <name>)".
 void ReadMeshBasic(Mesh& mesh, const std::string& file_name, const GridMeshOptions& grid = {});
+// Refuses, with a fatal error naming the file and the node or element
+// numbers, a mesh that the solver cannot work on: a coordinate or bed level
+// that is not finite, an element that holds a node twice (a quadrilateral
+// "1 2 3 3" is read as a triangle before this check), a 2D element of zero
+// area (twice its area at most 1e-10 times the square of its longest edge),
+// two elements with the same nodes, two nodes at one position (x and y; x, y
+// and z in a layered 3D mesh). It runs whatever `check_mesh` says.
+void CheckMeshGeometry(const Mesh& mesh, const std::string& file_name);
 // Blank projection -> "UTM-32", projection established (fatal "Unable to
 // establish projection: " otherwise), "LONG/LAT" coordinates to radians.
 void CompleteMeshProjection(Mesh& mesh);
