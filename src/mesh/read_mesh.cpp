@@ -10,6 +10,7 @@
 #include <vector>
 
 #include "io/setup.hpp"
+#include "io/zrn.hpp"
 #include "log/log.hpp"
 #include "mesh/cartography.hpp"
 #include "mesh/read_text.hpp"
@@ -17,6 +18,10 @@
 namespace vhd {
 
 namespace {
+
+// Boundary codes name setup sections one by one and size the boundary
+// tables; larger codes are faults of the file.
+constexpr int kMaxNodeCode = 99999;
 
 void ReadByExtension(Mesh& mesh, const std::string& file_name, const GridMeshOptions& grid) {
   const std::string ext = FileExtension(file_name);
@@ -74,6 +79,9 @@ void CheckMeshGeometry(const Mesh& mesh, const std::string& file_name) {
   for (int n = 1; n <= nd.nnodes; ++n) {
     if (!std::isfinite(nd.x[n]) || !std::isfinite(nd.y[n]) || !std::isfinite(nd.z[n]))
       Refuse(file_name, "Node " + std::to_string(n) + " has a coordinate or bed level that is not a finite number");
+    if (nd.code[n] > kMaxNodeCode)
+      Refuse(file_name, "Node " + std::to_string(n) + " has the boundary code " + std::to_string(nd.code[n]) +
+                            ", more than " + std::to_string(kMaxNodeCode));
   }
 
   // Nodes of every element in ascending order: a repeated node and two
@@ -172,7 +180,7 @@ void CompleteMeshProjection(Mesh& mesh) {
 void ReadMeshFile(Mesh& mesh, const std::string& file_name, const GridMeshOptions& grid, int check_mesh) {
   ReadMeshBasic(mesh, file_name, grid);
   CompleteMeshProjection(mesh);
-  if (check_mesh > 0) CheckMesh(mesh);
+  if (check_mesh > 0) CheckMesh(mesh, file_name);
 }
 
 void ReadMesh(Mesh& mesh) {
@@ -192,22 +200,26 @@ void ReadMesh(Mesh& mesh) {
   CompleteMeshProjection(mesh);
   int check_mesh = 1;
   SktReadKeyword("check_mesh", check_mesh, 1);
-  if (check_mesh > 0) CheckMesh(mesh);
+  if (check_mesh > 0) CheckMesh(mesh, file_name);
 }
 
-void CheckMesh(const Mesh& mesh) {
+void CheckMesh(const Mesh& mesh, const std::string& file_name) {
   const NodeTable& nd = mesh.nodes;
   const ElementTable& el = mesh.elements;
+  auto fail = [&](const std::string& text) {
+    if (!file_name.empty()) WriteLogLine("  Mesh file: " + ZrnLogName(file_name));
+    FatalError(text);
+  };
   for (int n = 1; n <= nd.nnodes; ++n) {
     if (nd.id[n] != n) {
       WriteLogLine("  Node " + std::to_string(n) + " has the id " + std::to_string(nd.id[n]));
-      FatalError("The node indicices and IDs must be the same");
+      fail("The node indicices and IDs must be the same");
     }
   }
   for (int e = 1; e <= el.nelements; ++e) {
     if (el.id[e] != e) {
       WriteLogLine("  Element " + std::to_string(e) + " has the id " + std::to_string(el.id[e]));
-      FatalError("The element indicices and IDs must be the same");
+      fail("The element indicices and IDs must be the same");
     }
   }
   std::vector<char> used(static_cast<std::size_t>(nd.nnodes) + 1, 0);
@@ -216,11 +228,11 @@ void CheckMesh(const Mesh& mesh) {
       const int n = ElementNode(el, e, j);
       if (n < 1) {
         WriteLogLine("  Element " + std::to_string(e) + " holds the node " + std::to_string(n));
-        FatalError("Node in the element table is lower than 1");
+        fail("Node in the element table is lower than 1");
       }
       if (n > nd.nnodes) {
         WriteLogLine("  Element " + std::to_string(e) + " holds the node " + std::to_string(n));
-        FatalError("Node in the element table is larger than the number of nodes");
+        fail("Node in the element table is larger than the number of nodes");
       }
       used[static_cast<std::size_t>(n)] = 1;
     }
@@ -232,7 +244,7 @@ void CheckMesh(const Mesh& mesh) {
       missing = true;
     }
   }
-  if (missing) FatalError("Nodes not included in mesh");
+  if (missing) fail("Nodes not included in mesh");
 }
 
 }  // namespace vhd

@@ -198,6 +198,11 @@ void ReadMeshBasicZrnu(Mesh& mesh, const std::string& file_name) {
         FileError(routine, file_name, where + " holds the node " + std::to_string(data.node_list[k]) +
                                           ", out of range 1 to " + std::to_string(nn));
     }
+    int dimension = 0, shape = 0, function_type = 0;
+    ElementTypeInfo(type, dimension, shape, function_type);
+    if (dimension != mesh.ndim)
+      FileError(routine, file_name, where + " has dimension " + std::to_string(dimension) + ", the header gives ndim " +
+                                        std::to_string(mesh.ndim));
     AddElement(mesh.elements, data.element_id[e], type, n, data.node_list.data() + first);
   }
 }

@@ -5,6 +5,7 @@
 
 #include <gtest/gtest.h>
 #include <malloc.h>
+#include <netcdf.h>
 #include <sys/resource.h>
 
 #include <cmath>
@@ -53,6 +54,8 @@ TEST(ReadBadMesh, FaultsAreRefusedNamingFileAndPlace) {
       {"flat.mesh", kFlat, "Element 2 has zero area"},
       {"thin.mesh", Edited(kFlat, "3 2 0 -1 1", "3 2 1e-12 -1 1"), "Element 2 has zero area"},
       {"same.mesh", Edited(kTwoSquares, "5 1 1 -1 1", "5 2 1 -1 1"), "Nodes 5 and 6 lie at one position"},
+      {"code.mesh", Edited(kTwoSquares, "6 2 1 -1 1", "6 2 1 -1 100000"),
+       "Node 6 has the boundary code 100000, more than 99999"},
       {"many.mesh", Edited(kTwoSquares, "2 4 25", "200000000 4 25"),
        "Header gives 200000000 elements, more than the file can hold (file "},
       {"nodes.mesh", Edited(kTwoSquares, "6 UTM-32", "2000000000 UTM-32"),
@@ -68,6 +71,10 @@ TEST(ReadBadMesh, FaultsAreRefusedNamingFileAndPlace) {
   EXPECT_FATAL(ReadMeshFile(m, dir.file("flat.mesh"), {}, 0),
                "ReadMesh: Element 2 has zero area (file " + dir.file("flat.mesh") + ")");
   EXPECT_FATAL(ReadMeshFile(m, dir.file("same.mesh"), {}, 0), "Nodes 5 and 6 lie at one position");
+  // The faults of the mesh check name the file in the line before them.
+  WriteTextFile(dir.file("ids.mesh"), Edited(kTwoSquares, "2 2 3 6 5", "7 2 3 6 5"));
+  EXPECT_FATAL(ReadMeshFile(m, dir.file("ids.mesh")), "Mesh file: " + dir.file("ids.mesh") +
+                                                         "\n \n Fatal error: The element indicices and IDs must be the same");
 }
 
 // "1 2 3 3" in a quadrilateral file is a triangle: in the ascii mesh, in the
@@ -108,7 +115,8 @@ TEST(ReadBadMesh, QuadrilateralWithItsLastNodeRepeatedIsATriangle) {
   }
 }
 
-// A zrnu mesh (written without checks) with a value that is not a number.
+// A zrnu mesh (written without checks) with a value that is not a number,
+// or with a header that does not fit its elements.
 TEST(ReadBadMesh, ZrnuNodesMustBeFinite) {
   TempDir dir;
   const double nan = std::numeric_limits<double>::quiet_NaN(), inf = std::numeric_limits<double>::infinity();
@@ -134,6 +142,15 @@ TEST(ReadBadMesh, ZrnuNodesMustBeFinite) {
     EXPECT_FATAL(ReadMeshFile(r, dir.file("a.zrnu")), "ReadMesh: Node " + std::to_string(c.node) +
                                                           " has a coordinate or bed level that is not a finite number");
   }
+  // A header that calls the two triangles a 3D mesh.
+  int ncid = -1;
+  const int items[5] = {4, 2, 3, 5, 5};
+  ASSERT_EQ(nc_open(dir.file("a.zrnu").c_str(), NC_WRITE, &ncid), NC_NOERR);
+  ASSERT_EQ(nc_redef(ncid), NC_NOERR);
+  ASSERT_EQ(nc_put_att_int(ncid, NC_GLOBAL, "zrn_block_TANO_KX", NC_INT, 5, items), NC_NOERR);
+  ASSERT_EQ(nc_close(ncid), NC_NOERR);
+  Mesh r;
+  EXPECT_FATAL(ReadMeshFile(r, dir.file("a.zrnu")), "Element 1 has dimension 2, the header gives ndim 3 (file ");
 }
 
 // Header counts of other text formats against the file size, and running out
