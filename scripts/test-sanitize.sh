@@ -14,6 +14,7 @@ cmake -S . -B build-asan -G Ninja -DCMAKE_BUILD_TYPE=Release -DVHD_SANITIZE=ON -
 cmake --build build-asan -j "$(nproc)"
 # halt_on_error: an undefined-behaviour report ends the program with an
 # error status, as an address report does.
-ASAN_OPTIONS=${ASAN_OPTIONS:-detect_leaks=1:abort_on_error=0} \
+ASAN_OPTIONS=${ASAN_OPTIONS:-detect_leaks=1} \
+LSAN_OPTIONS=${LSAN_OPTIONS:-suppressions=$(pwd)/scripts/lsan-suppressions.txt} \
 UBSAN_OPTIONS=${UBSAN_OPTIONS:-halt_on_error=1:print_stacktrace=1} \
   ctest --test-dir build-asan --output-on-failure -j "$(nproc)" --timeout 3600
