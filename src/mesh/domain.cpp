@@ -4,6 +4,7 @@
 #include "mesh/domain.hpp"
 
 #include <algorithm>
+#include <cmath>
 #include <limits>
 #include <map>
 
@@ -18,6 +19,7 @@ namespace vhd {
 namespace {
 
 constexpr double kRadToDeg = 57.29577951308232;
+constexpr double kNaN = std::numeric_limits<double>::quiet_NaN();
 
 double HighestNode(const Mesh& mesh) {
   double zmax = -std::numeric_limits<double>::max();
@@ -114,11 +116,12 @@ void PrintMeshSummary(const Mesh& mesh, int nsections, bool subdomain) {
     lo[1] = hi[1] = nd.y[1];
     lo[2] = hi[2] = nd.z[1];
   }
+  // A value that is not a number shows in both extremes.
   for (int n = 2; n <= nd.nnodes; ++n) {
     const double v[3] = {nd.x[n], nd.y[n], nd.z[n]};
     for (int k = 0; k < 3; ++k) {
-      lo[k] = std::min(lo[k], v[k]);
-      hi[k] = std::max(hi[k], v[k]);
+      lo[k] = std::isnan(lo[k]) || std::isnan(v[k]) ? kNaN : std::min(lo[k], v[k]);
+      hi[k] = std::isnan(hi[k]) || std::isnan(v[k]) ? kNaN : std::max(hi[k], v[k]);
     }
   }
   const bool geographic = IsGeographic(mesh.projection);

@@ -1,6 +1,7 @@
 // The ASCII mesh format (.mesh): reader and writer.
 
 #include <cstdio>
+#include <limits>
 #include <memory>
 #include <set>
 #include <vector>
@@ -75,6 +76,7 @@ void ReadMeshBasicAscii(Mesh& mesh, const std::string& file_name) {
   AsciiHeader h;
   if (!ParseHeader(in.line(), h)) in.Fail("Header line must begin with the number of nodes");
   if (h.nnodes < 1) in.Fail("Number of nodes must be at least 1, found " + std::to_string(h.nnodes));
+  in.CheckCount("nodes", h.nnodes, 5);
   double probe = 1.0;
   if (h.unit_code != kUvqUmeter && uvqConvertUnit(h.unit_code, kUvqUmeter, probe) != 0)
     in.Fail("Unit code " + std::to_string(h.unit_code) + " is not a unit of length");
@@ -103,9 +105,13 @@ void ReadMeshBasicAscii(Mesh& mesh, const std::string& file_name) {
   if (max_nodes < ElementTypeNodeCount(type) || max_nodes > kMaxNodesPerElement)
     in.Fail("Element type " + std::to_string(type) + " does not fit " + std::to_string(max_nodes) +
             " nodes per element");
+  in.CheckCount("elements", nelements, max_nodes + 1);
+  const long long nindexes = static_cast<long long>(nelements) * max_nodes;
+  if (nindexes > std::numeric_limits<int>::max()) in.Fail("Too many element nodes");
 
-  AllocateElementsBasic(mesh.elements, nelements, nelements * max_nodes);
+  AllocateElementsBasic(mesh.elements, nelements, static_cast<int>(nindexes));
   std::vector<int> row(static_cast<std::size_t>(max_nodes) + 1);
+  std::vector<int> nodes(static_cast<std::size_t>(max_nodes));
   for (int e = 1; e <= nelements; ++e) {
     in.Require("element " + std::to_string(e) + " of " + std::to_string(nelements) + " expected");
     in.Ints("Element line must hold id and " + std::to_string(max_nodes) + " node numbers", 0, max_nodes + 1,
@@ -114,13 +120,14 @@ void ReadMeshBasicAscii(Mesh& mesh, const std::string& file_name) {
     for (int j = 1; j <= max_nodes; ++j) {
       if (row[j] < 0 || row[j] > h.nnodes)
         in.Fail("Node number " + std::to_string(row[j]) + " out of range 0 to " + std::to_string(h.nnodes));
-      if (row[j] > 0) ++positive;
+      if (row[j] > 0) nodes[static_cast<std::size_t>(positive++)] = row[j];
     }
-    const int etype = positive == 3 && max_nodes > 3 ? 21 : type;
+    int etype = positive == 3 && max_nodes > 3 ? 21 : type;
     if (positive != ElementTypeNodeCount(etype))
       in.Fail("Element with " + std::to_string(positive) + " nodes does not fit element type " +
               std::to_string(etype));
-    AddElement(mesh.elements, row[0], etype, max_nodes, row.data() + 1);
+    const int n = CollapseRepeatedLastNode(etype, positive, nodes.data());
+    AddElement(mesh.elements, row[0], etype, n, nodes.data());
   }
   mesh.ndim = 2;
 }

@@ -145,6 +145,8 @@ void ReadMeshBasicADCIRC(Mesh& mesh, const std::string& file_name) {
   in.Ints("Second line must hold the numbers of elements and nodes", 0, 2, count);
   const int ne = count[0], np = count[1];
   if (ne < 1 || np < 1) in.Fail("Numbers of elements and nodes must be at least 1");
+  in.CheckCount("nodes", np, 4);
+  in.CheckCount("elements", ne, 5);
   b.Reserve(np, ne, 3);
   for (int n = 0; n < np; ++n) {
     in.Require("node line expected");
@@ -210,6 +212,8 @@ void ReadMeshBasicFem(Mesh& mesh, const std::string& file_name) {
       ne = d[1];
       nbn = d[2];
       if (nn < 1 || ne < 1 || (nbn != 3 && nbn != 4)) in.Fail("DIMENS values not supported");
+      in.CheckCount("nodes", nn, 2);
+      in.CheckCount("elements", ne, nbn);
       z.assign(static_cast<std::size_t>(nn), 0.0);
       more = in.NextNonBlank();
     } else if (block == "NODE") {

@@ -76,6 +76,7 @@ struct GmshReader {
         const int at = dim == 0 ? 4 : 7;  // points: tag x y z; others: tag and a bounding box
         in.Ints("Entity line expected", 0, 1, &tag);
         in.Ints("Entity line must hold its physical tags", at, 1, &nphys);
+        in.CheckCount("physical tags", nphys, 1);
         std::vector<int> phys(static_cast<std::size_t>(std::max(nphys, 0)));
         if (nphys > 0) in.Ints("Entity line must hold its physical tags", at + 1, nphys, phys.data());
         if (dim == 1) curve_groups[tag] = phys;
@@ -104,7 +105,8 @@ struct GmshReader {
       in.Require("node block header expected");
       int bh[4];
       in.Ints("Node block header must hold dimension, entity, parametric, count", 0, 4, bh);
-      std::vector<int> tags(static_cast<std::size_t>(bh[3]));
+      in.CheckCount("nodes", bh[3], 4);
+      std::vector<int> tags(static_cast<std::size_t>(std::max(bh[3], 0)));
       for (int k = 0; k < bh[3]; ++k) {
         in.Require("node tag expected");
         in.Ints("Node tag expected", 0, 1, &tags[static_cast<std::size_t>(k)]);

@@ -65,15 +65,26 @@ void ReadMesh(Mesh& mesh);
 // The same without the setup file: the reader by extension and the completion.
 void ReadMeshFile(Mesh& mesh, const std::string& file_name, const GridMeshOptions& grid = {},
                   int check_mesh = 1);
-// Only the reader chosen by the extension (coordinates as in the file).
+// Only the reader chosen by the extension (coordinates as in the file),
+// followed by CheckMeshGeometry; running out of memory while reading is the
+// fatal error "ReadMesh: Out of memory (file <name>)".
 void ReadMeshBasic(Mesh& mesh, const std::string& file_name, const GridMeshOptions& grid = {});
+// Refuses, with a fatal error naming the file and the node or element
+// numbers, a mesh that the solver cannot work on: a coordinate or bed level
+// that is not finite, a node code above 99999, an element that holds a node twice (a quadrilateral
+// "1 2 3 3" is read as a triangle before this check), a 2D element of zero
+// area (twice its area at most 1e-10 times the square of its longest edge),
+// two elements with the same nodes, two nodes at one position (x and y; x, y
+// and z in a layered 3D mesh). It runs whatever `check_mesh` says.
+void CheckMeshGeometry(const Mesh& mesh, const std::string& file_name);
 // Blank projection -> "UTM-32", projection established (fatal "Unable to
 // establish projection: " otherwise), "LONG/LAT" coordinates to radians.
 void CompleteMeshProjection(Mesh& mesh);
 
 // Node and element ids equal their positions, element nodes within 1 ..
-// nnodes, every node in some element.
-void CheckMesh(const Mesh& mesh);
+// nnodes, every node in some element. A fault is logged with the mesh file
+// (when named) before the fatal error.
+void CheckMesh(const Mesh& mesh, const std::string& file_name = "");
 
 void ReadMeshBasicAscii(Mesh& mesh, const std::string& file_name);
 void ReadMeshBasicZrnu(Mesh& mesh, const std::string& file_name);

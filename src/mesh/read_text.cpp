@@ -4,6 +4,7 @@
 #include <cctype>
 #include <charconv>
 #include <cstdlib>
+#include <filesystem>
 #include <limits>
 
 #include "io/zrn.hpp"
@@ -90,6 +91,12 @@ int ElementTypeNodeCount(int type) {
   }
 }
 
+int CollapseRepeatedLastNode(int& type, int n, const int* nodes) {
+  if (type != 25 || n != 4 || nodes[3] != nodes[2]) return n;
+  type = 21;
+  return 3;
+}
+
 // ---- TextFile --------------------------------------------------------------------------
 
 void FileError(std::string_view routine, const std::string& path, std::string_view what) {
@@ -99,6 +106,14 @@ void FileError(std::string_view routine, const std::string& path, std::string_vi
 TextFile::TextFile(std::string routine, const std::string& path)
     : routine_(std::move(routine)), path_(path), in_(path) {
   if (!in_) FileError(routine_, path_, "Unable to open file");
+  std::error_code ec;
+  size_ = std::filesystem::file_size(path, ec);
+  if (ec) size_ = 0;
+}
+
+void TextFile::CheckCount(std::string_view what, long long count, int fields) const {
+  if (count > 0 && static_cast<std::uintmax_t>(count) * 2u * static_cast<std::uintmax_t>(fields) > size_ + 1)
+    Fail("Header gives " + std::to_string(count) + " " + std::string(what) + ", more than the file can hold");
 }
 
 bool TextFile::Next() {
@@ -167,6 +182,7 @@ void MeshBuilder::AddNode(int file_id, double x, double y, double z, int code) {
 }
 
 void MeshBuilder::AddElement(int type, const int* file_ids, int n, int line) {
+  n = CollapseRepeatedLastNode(type, n, file_ids);
   type_.push_back(type);
   nodes_.insert(nodes_.end(), file_ids, file_ids + n);
   start_.push_back(static_cast<int>(nodes_.size()));

@@ -3,6 +3,7 @@
 // free-format fields, strict number parsing, and a builder that collects nodes
 // and elements named by file identifiers and turns them into a Mesh.
 
+#include <cstdint>
 #include <fstream>
 #include <string>
 #include <string_view>
@@ -26,6 +27,9 @@ std::string FileBaseName(const std::string& file_name);
 
 // Nodes of an element of the given type code; 0 for an unknown code.
 int ElementTypeNodeCount(int type);
+// A quadrilateral (type 25) written with its last node repeated ("1 2 3 3")
+// is a triangle: sets the type to 21 and returns 3. Otherwise returns n.
+int CollapseRepeatedLastNode(int& type, int n, const int* nodes);
 
 // A text file read line by line. Every failure ends the run with
 // "<routine>: <what> (file <name>, line <n>)".
@@ -50,10 +54,16 @@ public:
   void Doubles(std::string_view what, int first, int n, double* values) const;
 
   [[noreturn]] void Fail(std::string_view what) const;
+  // Refuses a count from a header that the file cannot hold, each of the
+  // `count` records taking at least `fields` fields of two characters (a
+  // digit and a separator): "Header gives <count> <what>, more than the file
+  // can hold". Header counts size the tables before any data is read.
+  void CheckCount(std::string_view what, long long count, int fields) const;
 
 private:
   std::string routine_;
   std::string path_;
+  std::uintmax_t size_ = 0;
   std::ifstream in_;
   std::string line_;
   int number_ = 0;

@@ -182,9 +182,11 @@ void ReadMeshBasicZrnu(Mesh& mesh, const std::string& file_name) {
     AddNode(mesh.nodes, data.node_id[n], data.x[n], data.y[n], data.z[n], data.node_code[n]);
   AllocateElementsBasic(mesh.elements, ne, std::max(1, data.node_start[ne + 1] - 1));
   for (int e = 1; e <= ne; ++e) {
-    const int first = data.node_start[e], n = data.node_start[e + 1] - first;
+    const int first = data.node_start[e];
     int type = data.element_type[e];
+    int n = data.node_start[e + 1] - first;
     if (type == 25 && n == 3) type = 21;
+    n = CollapseRepeatedLastNode(type, n, data.node_list.data() + first);
     const std::string where = "Element " + std::to_string(e);
     if (ElementTypeNodeCount(type) == 0)
       FileError(routine, file_name, where + " has the unknown element type " + std::to_string(type));
@@ -196,6 +198,11 @@ void ReadMeshBasicZrnu(Mesh& mesh, const std::string& file_name) {
         FileError(routine, file_name, where + " holds the node " + std::to_string(data.node_list[k]) +
                                           ", out of range 1 to " + std::to_string(nn));
     }
+    int dimension = 0, shape = 0, function_type = 0;
+    ElementTypeInfo(type, dimension, shape, function_type);
+    if (dimension != mesh.ndim)
+      FileError(routine, file_name, where + " has dimension " + std::to_string(dimension) + ", the header gives ndim " +
+                                        std::to_string(mesh.ndim));
     AddElement(mesh.elements, data.element_id[e], type, n, data.node_list.data() + first);
   }
 }

@@ -4,14 +4,13 @@
 
 #include <algorithm>
 #include <new>
+#include <vector>
 
 #include "log/log.hpp"
 
 namespace vhd {
 
 namespace {
-
-constexpr const char* kBuildError = "InsertElementd2DSearchTree: Error building search tree - possibly erroneous mesh";
 
 struct Corners {
   int n = 0;
@@ -87,6 +86,24 @@ SearchTree2D::Cell Quadrant(const SearchTree2D::Cell& p, int k) {
   return q;
 }
 
+// Moves the list of a leaf to the end of `entries` with room for twice as
+// many elements (the old slots stay unused).
+void GrowLeaf(SearchTree2D& tree, int cell) {
+  SearchTree2D::Cell& leaf = tree.cells[cell];
+  const int block = static_cast<int>(tree.entries.size());
+  tree.entries.resize(tree.entries.size() + 2 * static_cast<std::size_t>(leaf.capacity), 0);
+  std::copy_n(tree.entries.begin() + leaf.block, leaf.count, tree.entries.begin() + block);
+  leaf.block = block;
+  leaf.capacity *= 2;
+}
+
+void Append(SearchTree2D& tree, int cell, int e) {
+  if (tree.cells[cell].count == tree.cells[cell].capacity) GrowLeaf(tree, cell);
+  SearchTree2D::Cell& leaf = tree.cells[cell];
+  tree.entries[static_cast<std::size_t>(leaf.block + leaf.count)] = e;
+  ++leaf.count;
+}
+
 void Insert(const Mesh& mesh, SearchTree2D& tree, int cell, int e, const Corners& ce, int depth) {
   if (!Meets(ce, tree.cells[cell])) return;
   if (tree.cells[cell].count < 0) {
@@ -94,39 +111,44 @@ void Insert(const Mesh& mesh, SearchTree2D& tree, int cell, int e, const Corners
     for (int k = 0; k < 4; ++k) Insert(mesh, tree, first + k, e, ce, depth + 1);
     return;
   }
-  SearchTree2D::Cell& leaf = tree.cells[cell];
-  if (leaf.count < kSearchTreeCapacity) {
-    tree.entries[static_cast<std::size_t>(leaf.block + leaf.count)] = e;
-    ++leaf.count;
+  const SearchTree2D::Cell leaf = tree.cells[cell];
+  if (leaf.count < kSearchTreeCapacity || depth >= kSearchTreeMaxDepth) {
+    Append(tree, cell, e);
     return;
   }
-  // Full leaf: split into the four quadrants.
-  if (depth >= kSearchTreeMaxDepth) FatalError(kBuildError);
-  int items[kSearchTreeCapacity + 1];
-  Corners corners[kSearchTreeCapacity + 1];
-  std::copy_n(tree.entries.begin() + leaf.block, kSearchTreeCapacity, items);
-  items[kSearchTreeCapacity] = e;
+  // Full leaf: split into the four quadrants, unless the split would not
+  // separate the elements (they all meet at one point, such as the elements
+  // around a node of high valence): the leaf then takes one more.
+  const int nitems = leaf.count + 1;
+  std::vector<int> items(static_cast<std::size_t>(nitems));
+  std::vector<Corners> corners(static_cast<std::size_t>(nitems));
+  std::copy_n(tree.entries.begin() + leaf.block, leaf.count, items.begin());
+  items[leaf.count] = e;
   SearchTree2D::Cell quadrant[4];
   for (int k = 0; k < 4; ++k) quadrant[k] = Quadrant(leaf, k);
   int placements = 0;
-  for (int i = 0; i <= kSearchTreeCapacity; ++i) {
-    if (i < kSearchTreeCapacity) LoadCorners(mesh, tree, items[i], corners[i]);
+  for (int i = 0; i < nitems; ++i) {
+    if (i < leaf.count) LoadCorners(mesh, tree, items[i], corners[i]);
     else corners[i] = ce;
     for (int k = 0; k < 4; ++k) placements += Meets(corners[i], quadrant[k]) ? 1 : 0;
   }
-  if (placements >= 3 * kSearchTreeCapacity) FatalError(kBuildError);
+  if (placements >= 3 * (nitems - 1)) {
+    Append(tree, cell, e);
+    return;
+  }
 
   const int first = static_cast<int>(tree.cells.size());
-  const int block = leaf.block;
   for (int k = 0; k < 4; ++k) {
-    quadrant[k].block = k == 0 ? block : static_cast<int>(tree.entries.size()) + (k - 1) * kSearchTreeCapacity;
+    quadrant[k].block = k == 0 ? leaf.block : static_cast<int>(tree.entries.size()) + (k - 1) * kSearchTreeCapacity;
+    quadrant[k].capacity = k == 0 ? leaf.capacity : kSearchTreeCapacity;
     tree.cells.push_back(quadrant[k]);
   }
   tree.entries.resize(tree.entries.size() + 3 * kSearchTreeCapacity, 0);
   tree.cells[cell].child = first;
   tree.cells[cell].count = -1;
-  for (int i = 0; i <= kSearchTreeCapacity; ++i)
-    for (int k = 0; k < 4; ++k) Insert(mesh, tree, first + k, items[i], corners[i], depth + 1);
+  for (int i = 0; i < nitems; ++i)
+    for (int k = 0; k < 4; ++k) Insert(mesh, tree, first + k, items[static_cast<std::size_t>(i)],
+                                       corners[static_cast<std::size_t>(i)], depth + 1);
 }
 
 inline bool Holds(const SearchTree2D::Cell& c, double x, double y) {

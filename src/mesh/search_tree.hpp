@@ -7,11 +7,11 @@
 // element). A full leaf that receives one more element splits into its four
 // quadrants (split at the box midpoints; children in the order south-west,
 // south-east, north-west, north-east) and its elements go to the quadrants
-// they meet. When the quadrants together would hold 3 x 20 entries or more the
-// mesh has overlapping or degenerate elements: the fatal error
-// "InsertElementd2DSearchTree: Error building search tree - possibly erroneous
-// mesh". The same error ends a descent deeper than kSearchTreeMaxDepth levels
-// (many elements crowded on one point).
+// they meet. When the quadrants together would hold 3 x 20 entries or more
+// (3 x (n - 1) for a leaf that already holds n > 20) the split would not
+// separate the elements, as around a node shared by more than 20 elements:
+// the leaf keeps them all and lists more than 20. So does a leaf at depth
+// kSearchTreeMaxDepth (many elements crowded on one point).
 //
 // A point is found by descending into the first child whose box holds it
 // (bounds inclusive) and testing the leaf's elements in list order with area
@@ -43,9 +43,10 @@ struct SearchTree2D {
     int child = 0;  // first of the four children (consecutive), 0 for a leaf
     int count = 0;  // elements listed in a leaf; -1 marks an inner cell
     int block = 0;  // position of the leaf's list in `entries`
+    int capacity = kSearchTreeCapacity;  // slots of the leaf's list
   };
   std::vector<Cell> cells;  // cells[0] is the root
-  std::vector<int> entries; // leaf lists, kSearchTreeCapacity slots per leaf
+  std::vector<int> entries; // leaf lists, `capacity` slots per leaf
   bool columns = false;     // built over the columns of a layered 3D mesh
   int nitems = 0;           // elements (columns) inserted
 };

@@ -121,7 +121,7 @@ TEST(ReadAsciiMesh, BadInputEndsWithAMessageNamingFileAndLine) {
     std::string text, message;
   };
   const Case cases[] = {
-      {"short.mesh", "8 UTM-32\n1 0 0 0 0\n2 1 0 0 0\n", "ReadMeshBasicAscii: Unexpected end of file, node 3 of 8"},
+      {"short.mesh", "3 UTM-32\n1 0 0 0 0\n2 1 0 0 0\n", "ReadMeshBasicAscii: Unexpected end of file, node 3 of 3"},
       {"badnode.mesh", "2\n1 0 0 0 0\n2 1 x 0 0\n", "Node line must hold id, x, y, z, code"},
       {"range.mesh", edited("3 2 5 6 3", "3 2 5 6 9"), "Node number 9 out of range 0 to 6"},
       {"type.mesh", edited("3 4 25", "3 4 29"), "Unknown element type 29"},

@@ -167,7 +167,44 @@ TEST(SearchTree, BoxInsideALargeElement) {
   }
 }
 
-TEST(SearchTree, OverlappingElementsAreFatal) {
+// Elements around a node of high valence meet every quadrant of any box
+// around the node, so no split separates them: the leaf keeps them all. A fan
+// of n triangles around the centre of the bounding box (the first split
+// point), and 25 copies of one triangle (all in every quadrant).
+TEST(SearchTree, ElementsThatNoSplitSeparatesShareOneLeaf) {
+  for (const int n : {21, 24, 64}) {
+    SCOPED_TRACE(n);
+    Mesh m;
+    AllocateNodes(m.nodes, n + 1);
+    AddNode(m.nodes, 1, 0, 0, 0, 0);
+    for (int k = 0; k < n; ++k) {
+      const double a = 2 * M_PI * k / n;
+      AddNode(m.nodes, k + 2, std::cos(a), std::sin(a), 0, 1);
+    }
+    AllocateElementsBasic(m.elements, n, 3 * n);
+    for (int k = 0; k < n; ++k) {
+      const int tri[3] = {1, k + 2, (k + 1) % n + 2};
+      AddElement(m.elements, k + 1, 21, 3, tri);
+    }
+    SetupMeshGeometry(m);
+    SearchTree2D tree;
+    BuildSearchTree2D(m, tree);
+    int largest = 0;
+    for (const SearchTree2D::Cell& c : tree.cells) largest = std::max(largest, c.count);
+    EXPECT_EQ(largest, n);
+    for (int e = 1; e <= n; ++e) ASSERT_EQ(FindElementID2DSearchTree(m.elements.xc[e], m.elements.yc[e], m, tree), e);
+    const BruteForce brute(m, tree, 16);
+    std::mt19937 rng(n);
+    std::uniform_real_distribution<double> u(-1.05, 1.05);
+    for (int p = 0; p < 5000; ++p) {
+      const double x = u(rng), y = u(rng);
+      const std::vector<int> holding = brute.Holding(x, y);
+      const int found = FindElementID2DSearchTree(x, y, m, tree);
+      if (holding.empty()) ASSERT_EQ(found, 0) << x << " " << y;
+      else ASSERT_TRUE(std::find(holding.begin(), holding.end(), found) != holding.end()) << x << " " << y;
+    }
+  }
+
   Mesh m;
   AllocateNodes(m.nodes, 3);
   AddNode(m.nodes, 1, 0, 0, 0, 0);
@@ -178,7 +215,9 @@ TEST(SearchTree, OverlappingElementsAreFatal) {
   for (int e = 1; e <= 25; ++e) AddElement(m.elements, e, 21, 3, tri);
   SetupShapeData(m);
   SearchTree2D tree;
-  EXPECT_FATAL(BuildSearchTree2D(m, tree), "InsertElementd2DSearchTree: Error building search tree");
+  BuildSearchTree2D(m, tree);
+  EXPECT_EQ(FindElementID2DSearchTree(0.2, 0.2, m, tree), 1);
+  EXPECT_EQ(SearchTreeLeaf(tree, 0.2, 0.2).size(), 25u);
 }
 
 TEST(SearchTree, LayeredMeshSearchesItsColumns) {
