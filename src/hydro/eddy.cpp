@@ -38,7 +38,7 @@ void ReadEddyRecord(HdEddyRecord& r, const HdModule& hd, bool vertical) {
     r.value.constant_value = 0.002;
     r.value.values.assign(ne, 0.002);
     if (OpenOptionalSectionHD("CONSTANT_EDDY_FORMULATION")) {
-      ReadElementFieldHD(r.value, 0.002, ne, false, "Wrong format for constant formulation.", "SetupEddy",
+      ReadElementFieldHD(r.value, 0.002, hd.state.element_file_index, ne, false, "Wrong format for constant formulation.", "SetupEddy",
                          hd.time_axis);
       if (vertical) {
         SktReadKeyword("Ri_damping", r.Ri_damping, 0);
@@ -52,7 +52,7 @@ void ReadEddyRecord(HdEddyRecord& r, const HdModule& hd, bool vertical) {
     for (int e = 1; e <= ne; ++e) {
       if (!(r.value.values[e] >= 0.0)) {
         FatalError("SetupEddy: eddy viscosity " + NumberText(r.value.values[e]) + " of element " +
-                   std::to_string(e) + " must be 0 or more");
+                   std::to_string(FileIndex(hd.state.element_file_index, e)) + " must be 0 or more");
       }
     }
   } else if (r.type == kEddySmagorinsky) {
@@ -61,7 +61,7 @@ void ReadEddyRecord(HdEddyRecord& r, const HdModule& hd, bool vertical) {
     r.minimum_eddy_viscosity = 0.0;
     r.maximum_eddy_viscosity = 1.0e10;
     if (OpenOptionalSectionHD("SMAGORINSKY_FORMULATION")) {
-      ReadElementFieldHD(r.value, 0.28, ne, false, "Wrong format for Smagorinsky formulation.", "SetupEddy",
+      ReadElementFieldHD(r.value, 0.28, hd.state.element_file_index, ne, false, "Wrong format for Smagorinsky formulation.", "SetupEddy",
                          hd.time_axis);
       SktReadKeyword("minimum_eddy_viscosity", r.minimum_eddy_viscosity, 0.0);
       SktReadKeyword("maximum_eddy_viscosity", r.maximum_eddy_viscosity, 1.0e10);

@@ -14,6 +14,7 @@
 // (flooded elements exchange no water among themselves).
 
 #include <algorithm>
+#include <limits>
 #include <string>
 
 #include "core/omp.hpp"
@@ -43,7 +44,7 @@ void WriteBlowUpBlock(const HdModule& hd, const Mesh& mesh, std::string_view hea
   WriteLogLine(header);
   if (hd.nprocesses > 1) WriteValueLine("domain                : %", hd.process_id);
   WriteValueLine("time                  : %", t);
-  WriteValueLine("element number        : %", e);
+  WriteValueLine("element number        : %", mesh.elements.id[e]);
   WriteValueLine("x-coordinate (center) : %", mesh.elements.xc[e] * scale);
   WriteValueLine("y-coordinate (center) : %", mesh.elements.yc[e] * scale);
   WriteValueLine("total water depth (h) : %", s.h[e]);
@@ -204,22 +205,26 @@ bool CheckBlowUpHD(HdModule& hd, const Mesh& mesh, double t, int* status) {
   const double* eta = s.eta.data();
   const double* h = s.h.data();
 
-  int first = nown + 1;
+  // The element reported is the first in the mesh file's order.
+  const Array1<int>& place = mesh.elements.file_index;
+  const int none = std::numeric_limits<int>::max();
+  int first = none;
   VHD_OMP_PARALLEL_FOR_REDUCTION(min, first)
   for (int e = 1; e <= nown; ++e) {
-    if (!(eta[e] <= limit) && e < first) first = e;
+    if (!(eta[e] <= limit)) first = std::min(first, FileIndex(place, e));
   }
   std::string_view header;
-  if (first <= nown) {
+  if (first != none) {
     header = "BLOW-UP - Elevation too large";
   } else if (hd.flood_dry.type <= 0) {
     VHD_OMP_PARALLEL_FOR_REDUCTION(min, first)
     for (int e = 1; e <= nown; ++e) {
-      if (!(h[e] > 0.0) && e < first) first = e;
+      if (!(h[e] > 0.0)) first = std::min(first, FileIndex(place, e));
     }
-    if (first <= nown) header = "BLOW-UP - Total depth too small";
+    if (first != none) header = "BLOW-UP - Total depth too small";
   }
-  if (first > nown) return true;
+  if (first == none) return true;
+  if (!place.empty()) first = static_cast<int>(std::find(place.begin(), place.end(), first) - place.begin()) + 1;
 
   WriteBlowUpBlock(hd, mesh, header, first, t);
   if (status == nullptr) FatalError(header);

@@ -71,6 +71,10 @@ struct HdState {
   int nelements_owned = 0;  // owned elements 1 .. nelements_owned
   int nfaces = 0;
   int nnodes = 0;
+  // Place of each element in the mesh file (mesh/reorder.hpp): files read
+  // per element hold that order, messages name that number. Empty when the
+  // mesh is in file order.
+  Array1<int> element_file_index;
 
   // Per element.
   Array1<double> eta, d, h;       // m
@@ -150,6 +154,9 @@ struct ElementField {
   double time_a = 0.0, time_b = 0.0;
   double file_offset = 0.0;  // simulation start minus the file's first step (s)
   Array1<double> values_a, values_b;
+  // Format 3 on a renumbered mesh: the element order and the file's values.
+  Array1<int> file_index;
+  Array1<double> file_values;
 };
 
 // Stored bed-resistance codes (the setup's type minus one).

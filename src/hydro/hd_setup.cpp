@@ -200,6 +200,7 @@ void AllocateStateHD(HdModule& hd, const Mesh& mesh) {
   s.nelements_owned = el.nelements_int > 0 ? el.nelements_int : ne;
   s.nfaces = mesh.faces.nfaces;
   s.nnodes = mesh.nodes.nnodes;
+  s.element_file_index = el.file_index;
 
   for (Array1<double>* a : {&s.eta, &s.d, &s.h, &s.P, &s.Q, &s.u, &s.v, &s.length, &s.h_old, &s.P_old, &s.Q_old,
                             &s.cf, &s.cf_surface, &s.tau_x, &s.tau_y, &s.nu_t, &s.cfl_rate}) {
@@ -416,16 +417,18 @@ void InitialiseStateHD(HdModule& hd, const Mesh& mesh) {
       s.v[e] = ic.v_velocity_constant;
     }
   } else if (ic.type == 2) {
-    ReadElementFileHD(ic.file_name_2d, ic.surface_elevation_item_no, ne, s.eta, kWho);
+    ReadElementFileHD(ic.file_name_2d, ic.surface_elevation_item_no, s.element_file_index, ne, s.eta, kWho);
   } else if (ic.type == 3) {
     ZrnFile file;
     ZrnOpenInput(file, ic.file_name_2d);
-    ReadElementItemHD(file, ic.total_water_depth_item_no, 0, ne, s.h, kWho);
+    const Array1<int>& order = s.element_file_index;
+    Array1<double> scratch;
+    ReadElementItemHD(file, ic.total_water_depth_item_no, 0, order, ne, s.h, scratch, kWho);
     if (ic.still_water_depth_item_no > 0) {
-      ReadElementItemHD(file, ic.still_water_depth_item_no, 0, ne, s.d, kWho);
+      ReadElementItemHD(file, ic.still_water_depth_item_no, 0, order, ne, s.d, scratch, kWho);
     }
-    ReadElementItemHD(file, ic.u_velocity_item_no, 0, ne, s.u, kWho);
-    ReadElementItemHD(file, ic.v_velocity_item_no, 0, ne, s.v, kWho);
+    ReadElementItemHD(file, ic.u_velocity_item_no, 0, order, ne, s.u, scratch, kWho);
+    ReadElementItemHD(file, ic.v_velocity_item_no, 0, order, ne, s.v, scratch, kWho);
     zrnFileClose(file);
     zrnHeaderDestroy(file);
     if (ic.still_water_depth_item_no > 0) {

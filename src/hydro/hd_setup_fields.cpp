@@ -30,8 +30,8 @@ bool OpenOptionalSectionHD(std::string_view name) {
   return true;
 }
 
-void ReadElementItemHD(ZrnFile& file, int item, int step, int nelements, Array1<double>& values,
-                       std::string_view who) {
+void ReadElementItemHD(ZrnFile& file, int item, int step, const Array1<int>& file_index, int nelements,
+                       Array1<double>& values, Array1<double>& file_values, std::string_view who) {
   // Messages are formed only on failure: this also runs inside the time loop.
   const auto w = [who] { return std::string(who); };
   int nitems = 0;
@@ -49,26 +49,35 @@ void ReadElementItemHD(ZrnFile& file, int item, int step, int nelements, Array1<
   if (step >= file.time.nsteps) {
     FatalError(w() + ": " + FileText(file, item) + " has no time step " + std::to_string(step));
   }
-  values.assign(nelements, 0.0);
-  ZrnReadItemAtStep(file, step, item, values.begin(), nelements);
+  // The file holds the elements in the mesh file's order.
+  const bool renumbered = !file_index.empty();
+  Array1<double>& read = renumbered ? file_values : values;
+  if (read.size() != nelements) read.assign(nelements, 0.0);
+  ZrnReadItemAtStep(file, step, item, read.begin(), nelements);
   const double del = file.delete_value;
-  for (int e = 1; e <= nelements; ++e) {
-    if (!std::isfinite(values[e]) || values[e] == del) {
-      FatalError(w() + ": " + FileText(file, item) + " has no value for element " + std::to_string(e));
+  for (int k = 1; k <= nelements; ++k) {
+    if (!std::isfinite(read[k]) || read[k] == del) {
+      FatalError(w() + ": " + FileText(file, item) + " has no value for element " + std::to_string(k));
     }
+  }
+  if (renumbered) {
+    if (values.size() != nelements) values.assign(nelements, 0.0);
+    for (int e = 1; e <= nelements; ++e) values[e] = file_values[file_index[e]];
   }
 }
 
-void ReadElementFileHD(const std::string& file_name, int item, int nelements, Array1<double>& values,
-                       std::string_view who) {
+void ReadElementFileHD(const std::string& file_name, int item, const Array1<int>& file_index, int nelements,
+                       Array1<double>& values, std::string_view who) {
   ZrnFile file;
   ZrnOpenInput(file, file_name);
-  ReadElementItemHD(file, item, 0, nelements, values, who);
+  Array1<double> file_values;
+  ReadElementItemHD(file, item, 0, file_index, nelements, values, file_values, who);
   zrnFileClose(file);
   zrnHeaderDestroy(file);
 }
 
-void ReadElementFieldHD(ElementField& field, double def, int nelements, bool time_varying,
+void ReadElementFieldHD(ElementField& field, double def, const Array1<int>& file_index, int nelements,
+                        bool time_varying,
                         std::string_view format_message, std::string_view who, const TimeAxis& time) {
   SktReadKeyword("format", field.format, 0);
   const bool known = field.format == 0 || field.format == 2 || (time_varying && field.format == 3);
@@ -84,7 +93,7 @@ void ReadElementFieldHD(ElementField& field, double def, int nelements, bool tim
     FatalError(std::string(who) + ": file_name missing in " + SktSectionPath());
   }
   if (field.format == 2) {
-    ReadElementFileHD(field.file_name, field.item_number, nelements, field.values, who);
+    ReadElementFileHD(field.file_name, field.item_number, file_index, nelements, field.values, who);
     return;
   }
   // Format 3: open the file, check that it covers the simulation and read the
@@ -108,7 +117,9 @@ void ReadElementFieldHD(ElementField& field, double def, int nelements, bool tim
   } else if (first > 1e-6 || last < end - 1e-6) {
     FatalError("The data does not cover the entire simulation");
   }
-  ReadElementItemHD(field.file, field.item_number, 0, nelements, field.values_a, who);
+  field.file_index = file_index;
+  ReadElementItemHD(field.file, field.item_number, 0, field.file_index, nelements, field.values_a, field.file_values,
+                    who);
   field.values_b = field.values_a;
   field.time_a = field.time_b = first;
   field.step_b = 0;
@@ -125,7 +136,8 @@ bool UpdateElementFieldHD(ElementField& field, double t, std::string_view who) {
     field.time_a = field.time_b;
     ++field.step_b;
     field.time_b = StepTime(field.file, field.step_b, field.file_offset);
-    ReadElementItemHD(field.file, field.item_number, field.step_b, n, field.values_b, who);
+    ReadElementItemHD(field.file, field.item_number, field.step_b, field.file_index, n, field.values_b,
+                      field.file_values, who);
   }
   const double span = field.time_b - field.time_a;
   const double w = span > 0.0 ? std::fmin(1.0, std::fmax(0.0, (t - field.time_a) / span)) : 1.0;

@@ -80,7 +80,7 @@ std::string SourceText(const ElementField& f, std::string_view section) {
 // K from the current coefficient values (types 1 to 4), over every element. A
 // value that would give no or an infinite resistance stops the run naming the
 // first such element.
-void ConvertCoefficient(HdBedResistance& br, std::string_view who) {
+void ConvertCoefficient(HdBedResistance& br, const Array1<int>& file_index, std::string_view who) {
   const Array1<double>& c = br.coefficient.values;
   const int n = c.size();
   const int type = br.type;
@@ -107,7 +107,7 @@ void ConvertCoefficient(HdBedResistance& br, std::string_view who) {
   if (bad <= n) {
     const CoefficientKind kind = KindOf(type);
     FatalError(std::string(who) + ": " + kind.name + " " + NumberText(x[bad]) + " of element " +
-               std::to_string(bad) + " (" + SourceText(br.coefficient, kind.section) + ") must be " +
+               std::to_string(FileIndex(file_index, bad)) + " (" + SourceText(br.coefficient, kind.section) + ") must be " +
                (type == kBedDragCoefficient ? "0 or more" : "greater than 0"));
   }
 }
@@ -132,13 +132,14 @@ void SetupDirectional(HdModule& hd, bool parent_open) {
     if (br.directional_format == 0) {
       br.ks_directional[k].assign(ne, br.directional_constants[static_cast<std::size_t>(k)]);
     } else {
-      ReadElementFileHD(br.directional_file, br.directional_items[static_cast<std::size_t>(k)], ne,
+      ReadElementFileHD(br.directional_file, br.directional_items[static_cast<std::size_t>(k)],
+                        hd.state.element_file_index, ne,
                         br.ks_directional[k], "SetupBedResistanceHD");
     }
     for (int e = 1; e <= ne; ++e) {
       if (!(br.ks_directional[k][e] > 0.0)) {
         FatalError("SetupBedResistanceHD: directional roughness " + NumberText(br.ks_directional[k][e]) +
-                   " of element " + std::to_string(e) + " (value " + std::to_string(k + 1) +
+                   " of element " + std::to_string(FileIndex(hd.state.element_file_index, e)) + " (value " + std::to_string(k + 1) +
                    ") must be greater than 0");
       }
     }
@@ -161,7 +162,7 @@ void SetupWaveInduced(HdModule& hd, bool parent_open) {
                  SktSectionPath() + " must be 1 or more");
     }
     if (OpenOptionalSectionHD("GRAIN_DIAMETER")) {
-      ReadElementFieldHD(br.grain_diameter, 0.0002, ne, false, "Format not supported for grain diamete.",
+      ReadElementFieldHD(br.grain_diameter, 0.0002, hd.state.element_file_index, ne, false, "Format not supported for grain diamete.",
                          "SetupBedResistanceHD", hd.time_axis);
       SktCloseSection();
     }
@@ -179,7 +180,8 @@ void SetupWaveInduced(HdModule& hd, bool parent_open) {
   for (int e = 1; e <= ne; ++e) {
     if (!(br.grain_diameter.values[e] > 0.0)) {
       FatalError("SetupBedResistanceHD: grain diameter " + NumberText(br.grain_diameter.values[e]) +
-                 " of element " + std::to_string(e) + " must be greater than 0");
+                 " of element " + std::to_string(FileIndex(hd.state.element_file_index, e)) +
+                 " must be greater than 0");
     }
   }
   br.wave_height.assign(ne, 0.0);
@@ -254,13 +256,13 @@ void SetupBedResistanceHD(HdModule& hd, const Mesh& mesh) {
     br.coefficient.constant_value = kind.def;
     br.coefficient.format = 0;
     if (open && OpenOptionalSectionHD(kind.section)) {
-      ReadElementFieldHD(br.coefficient, kind.def, ne, true, kind.format_message, "SetupBedResistanceHD",
+      ReadElementFieldHD(br.coefficient, kind.def, hd.state.element_file_index, ne, true, kind.format_message, "SetupBedResistanceHD",
                          hd.time_axis);
       SktCloseSection();
     } else {
       br.coefficient.values.assign(ne, kind.def);
     }
-    ConvertCoefficient(br, "SetupBedResistanceHD");
+    ConvertCoefficient(br, hd.state.element_file_index, "SetupBedResistanceHD");
   } else if (br.type == kBedDirectionalRoughness) {
     SetupDirectional(hd, open);
     UpdateDirectionalK(hd);
@@ -276,7 +278,7 @@ void CALCRESISTANCEBED(HdModule& hd, const Mesh& mesh, double t) {
   if (br.type == kBedNone) return;
   if (br.type <= kBedRoughness) {
     if (UpdateElementFieldHD(br.coefficient, t, "CALCRESISTANCEBED")) {
-      ConvertCoefficient(br, "CALCRESISTANCEBED");
+      ConvertCoefficient(br, hd.state.element_file_index, "CALCRESISTANCEBED");
     }
   } else if (br.type == kBedDirectionalRoughness) {
     UpdateDirectionalK(hd);

@@ -141,6 +141,7 @@ void ReportCflViolations(std::string_view title, const Mesh& mesh, const Array1<
   const bool geographic = IsGeographic(mesh.projection);
   const double scale = geographic ? kRadToDeg : 1.0;
   bool violated = false;
+  const ElementTable& el = mesh.elements;
   for (int e = 1; e <= ne; ++e) {
     const double cfl = CflNumber(cfl_rate[e], dt);
     if (code[e] != kWet || !(cfl > 1.00001)) continue;
@@ -150,7 +151,7 @@ void ReportCflViolations(std::string_view title, const Mesh& mesh, const Array1<
       Warning(title);
       WriteValueLine("time                  : %", t);
       WriteValueLine("time step interval    : %", dt);
-      WriteValueLine("element number        : %", e);
+      WriteValueLine("element number        : %", el.id[e]);
       WriteValueLine("CFL number            : %", cfl);
       WriteValueLine("x-coordinate (center) : %", mesh.elements.xc[e] * scale);
       WriteValueLine("y-coordinate (center) : %", mesh.elements.yc[e] * scale);

@@ -13,6 +13,7 @@
 #include "io/setup.hpp"
 #include "log/log.hpp"
 #include "mesh/read_mesh.hpp"
+#include "mesh/reorder.hpp"
 
 namespace vhd {
 
@@ -42,7 +43,9 @@ void SetupOneMesh(DomainMesh& dm, int number, int number_of_dimensions) {
     AdjustMeshDepths(mesh, dm.minimum_depth, dm.thresshold_depth);
     if (mesh.ndim == 2) {
       SktReadKeyword("number_of_domains", dm.number_of_domains, 16);
-      SktReadKeyword("type_of_reordering", dm.type_of_reordering, 1);
+      SktReadKeyword("type_of_reordering", dm.type_of_reordering, kReorderHilbert);
+      if (dm.type_of_reordering != kReorderNone)
+        ReorderMesh(mesh, ElementOrder(mesh, dm.type_of_reordering, 1, mesh.elements.nelements));
     }
   }
   SetupMeshGeometry(mesh);

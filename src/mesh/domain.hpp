@@ -14,7 +14,8 @@
 //   minimum_depth, thresshold_depth   highest z: nodes with a non-zero code
 //                         and minimum_depth < z <= thresshold_depth get z = minimum_depth
 //   number_of_domains     16     handed to the domain partitioning (2D meshes)
-//   type_of_reordering    1      handed to the domain partitioning (2D meshes)
+//   type_of_reordering    1      element order of a 2D mesh (mesh/reorder.hpp): 0 the
+//                                file's, 1 Hilbert curve, 2 reverse Cuthill-McKee
 
 #include <vector>
 

@@ -12,6 +12,7 @@
 #include "io/units.hpp"
 #include "log/log.hpp"
 #include "mesh/cartography.hpp"
+#include "mesh/reorder.hpp"
 #include "mesh/search_tree.hpp"
 
 namespace vhd {
@@ -234,20 +235,23 @@ void MapGrid(DataFileState& st, const FemDataRequest& r, const ZrnSpatialAxis& a
             ZrnLogName(st.file.name) + "; they take the values at its edge");
 }
 
-// The mesh of a .zrnu file must be the caller's: same counts, same element nodes.
+// The mesh of a .zrnu file must be the caller's as read from its mesh file:
+// same counts, same element nodes in the file's numbering.
 void CheckSameMesh(const ZrnMeshData& fm, const Mesh& m, const std::string& file) {
   const ElementTable& el = m.elements;
+  const Array1<int> in_file_order = FileOrder(el.file_index, el.nelements);
   if (fm.nnodes() != m.nodes.nnodes || fm.nelements() != el.nelements)
     Refuse("Wrong data file", file,
            "the file's mesh has " + std::to_string(fm.nnodes()) + " nodes and " +
                std::to_string(fm.nelements()) + " elements, the model's " +
                std::to_string(m.nodes.nnodes) + " and " + std::to_string(el.nelements));
-  for (int e = 1; e <= el.nelements; ++e) {
+  for (int k = 1; k <= el.nelements; ++k) {
+    const int e = in_file_order[k];
     const int n = ElementNodeCount(el, e);
-    bool same = fm.node_start[e + 1] - fm.node_start[e] == n;
+    bool same = fm.node_start[k + 1] - fm.node_start[k] == n;
     for (int j = 1; same && j <= n; ++j)
-      same = fm.node_list[fm.node_start[e] + j - 1] == ElementNode(el, e, j);
-    if (!same) Refuse("Wrong data file", file, "element " + std::to_string(e) + " has other nodes");
+      same = fm.node_list[fm.node_start[k] + j - 1] == FileIndex(m.nodes.file_index, ElementNode(el, e, j));
+    if (!same) Refuse("Wrong data file", file, "element " + std::to_string(k) + " has other nodes");
   }
 }
 
@@ -301,6 +305,9 @@ void MapMesh(DataFileState& st, const FemDataRequest& r, const ZrnSpatialAxis& a
     nweights = 2;
   }
   SetMapSize(st, nweights);
+  // The file holds elements and nodes in the mesh file's order.
+  auto file_element = [&el](int e) { return FileIndex(el.file_index, e) - 1; };
+  auto file_node = [&m](int n) { return FileIndex(m.nodes.file_index, n) - 1; };
   SearchTree2D tree;
   if (r.location == FemDataLocation::kPoints) BuildSearchTree2D(m, tree);
   for (int i = 1; i <= st.ntargets; ++i) {
@@ -309,26 +316,26 @@ void MapMesh(DataFileState& st, const FemDataRequest& r, const ZrnSpatialAxis& a
       case FemDataLocation::kElements:
         if (on_nodes) {
           const int n = ElementNodeCount(el, e);
-          for (int j = 1; j <= n; ++j) SetWeight(st, i, j - 1, ElementNode(el, e, j) - 1, 1.0 / n);
+          for (int j = 1; j <= n; ++j) SetWeight(st, i, j - 1, file_node(ElementNode(el, e, j)), 1.0 / n);
         } else {
-          SetWeight(st, i, 0, e - 1, 1.0);
+          SetWeight(st, i, 0, file_element(e), 1.0);
         }
         break;
       case FemDataLocation::kNodes:
         if (!on_nodes)
           Refuse("Wrong data file", file,
                  "node values are wanted and the item holds element values");
-        SetWeight(st, i, 0, e - 1, 1.0);
+        SetWeight(st, i, 0, file_node(e), 1.0);
         break;
       case FemDataLocation::kFaces:
         if (on_nodes) {
           const int n = FaceNodeCount(fc, e);
-          for (int j = 1; j <= n; ++j) SetWeight(st, i, j - 1, FaceNode(fc, e, j) - 1, 1.0 / n);
+          for (int j = 1; j <= n; ++j) SetWeight(st, i, j - 1, file_node(FaceNode(fc, e, j)), 1.0 / n);
         } else if (fc.element2[e] > 0) {
-          SetWeight(st, i, 0, fc.element1[e] - 1, 0.5);
-          SetWeight(st, i, 1, fc.element2[e] - 1, 0.5);
+          SetWeight(st, i, 0, file_element(fc.element1[e]), 0.5);
+          SetWeight(st, i, 1, file_element(fc.element2[e]), 0.5);
         } else {
-          SetWeight(st, i, 0, fc.element1[e] - 1, 1.0);
+          SetWeight(st, i, 0, file_element(fc.element1[e]), 1.0);
         }
         break;
       case FemDataLocation::kPoints: {
@@ -340,7 +347,7 @@ void MapMesh(DataFileState& st, const FemDataRequest& r, const ZrnSpatialAxis& a
                  "point " + std::to_string(i) + " (" + NumberText(x, 1) + ", " + NumberText(y, 1) +
                      ") lies outside the mesh");
         if (!on_nodes) {
-          SetWeight(st, i, 0, h - 1, 1.0);
+          SetWeight(st, i, 0, file_element(h), 1.0);
           break;
         }
         // Linear in the triangle of the element that holds the point
@@ -349,15 +356,15 @@ void MapMesh(DataFileState& st, const FemDataRequest& r, const ZrnSpatialAxis& a
         const int a = ElementNode(el, h, 1), b = ElementNode(el, h, 2), c = ElementNode(el, h, 3);
         double w[3] = {1.0, 0.0, 0.0};
         if (AreaCoordinates(m.nodes, a, b, c, x, y, w) || n < 4) {
-          SetWeight(st, i, 0, a - 1, w[0]);
-          SetWeight(st, i, 1, b - 1, w[1]);
-          SetWeight(st, i, 2, c - 1, w[2]);
+          SetWeight(st, i, 0, file_node(a), w[0]);
+          SetWeight(st, i, 1, file_node(b), w[1]);
+          SetWeight(st, i, 2, file_node(c), w[2]);
         } else {
           const int d = ElementNode(el, h, 4);
           AreaCoordinates(m.nodes, a, c, d, x, y, w);
-          SetWeight(st, i, 0, a - 1, w[0]);
-          SetWeight(st, i, 1, c - 1, w[1]);
-          SetWeight(st, i, 2, d - 1, w[2]);
+          SetWeight(st, i, 0, file_node(a), w[0]);
+          SetWeight(st, i, 1, file_node(c), w[1]);
+          SetWeight(st, i, 2, file_node(d), w[2]);
         }
         break;
       }

@@ -542,6 +542,20 @@ double ElementAreaMetres(const Mesh& mesh, int e) {
   return el.area[e] * kMeshEarthRadius * kMeshEarthRadius * el.cos_lat[e];
 }
 
+void OrderNodeElements(Mesh& mesh) {
+  NodeTable& nd = mesh.nodes;
+  const ElementTable& el = mesh.elements;
+  auto by_centre = [&el](int a, int b) {
+    if (el.xc[a] != el.xc[b]) return el.xc[a] < el.xc[b];
+    if (el.yc[a] != el.yc[b]) return el.yc[a] < el.yc[b];
+    if (el.zc[a] != el.zc[b]) return el.zc[a] < el.zc[b];
+    return a < b;
+  };
+  for (int n = 1; n <= nd.nnodes; ++n)
+    std::sort(nd.element_list.data() + nd.element_start[n], nd.element_list.data() + nd.element_start[n + 1],
+              by_centre);
+}
+
 void CalcNodeValues(Mesh& mesh) {
   NodeTable& nd = mesh.nodes;
   const ElementTable& el = mesh.elements;
@@ -550,10 +564,18 @@ void CalcNodeValues(Mesh& mesh) {
   } catch (const std::bad_alloc&) {
     FatalError("CalcNodeValues: Out of memory");
   }
-  for (int e = 1; e <= el.nelements; ++e) {
-    if (el.id[e] == 0) continue;
-    const int n = ElementNodeCount(el, e);
-    for (int j = 1; j <= n; ++j) nd.area[ElementNode(el, e, j)] += el.area[e] / n;
+  // Summed over the node's element list, whose order does not depend on the
+  // numbering; a node listed twice in one element takes its share twice.
+  for (int i = 1; i <= nd.nnodes; ++i) {
+    double a = 0;
+    for (int q = nd.element_start[i]; q < nd.element_start[i + 1]; ++q) {
+      const int e = nd.element_list[q];
+      if (el.id[e] == 0) continue;
+      const int n = ElementNodeCount(el, e);
+      for (int j = 1; j <= n; ++j)
+        if (ElementNode(el, e, j) == i) a += el.area[e] / n;
+    }
+    nd.area[i] = a;
   }
 }
 
@@ -631,6 +653,7 @@ void SetupMeshGeometry(Mesh& mesh) {
   CreateElementFaceConnectivity(mesh);
   CreateNodeNodeConnectivity(mesh);
   CalcElementValues(mesh.elements, mesh.nodes, mesh.projection);
+  OrderNodeElements(mesh);
   CalcFaceValues(mesh.faces, mesh.elements, mesh.nodes, mesh.projection);
   CalcNodeValues(mesh);
   if (mesh.nodes.nnodes_int == 0) mesh.nodes.nnodes_int = mesh.nodes.nnodes;

@@ -111,8 +111,13 @@ struct NodeTable {
   Array1<int> code;  // 0 interior, 1 land, >= 2 open boundary
   Array1<double> x, y, z;  // z: bed level (m)
   Array1<double> value;
+  // Position of each node in the mesh file; empty while the table is in file
+  // order (mesh/reorder.hpp).
+  Array1<int> file_index;
 
-  // Node -> elements (every element that contains the node, in element order).
+  // Node -> elements (every element that contains the node), ordered by the
+  // element centres (x, then y): a sum over a node's elements then does not
+  // depend on the numbering.
   Array1<int> element_start, element_list;
   // Node -> neighbouring nodes (joined by an element edge), ascending.
   Array1<int> node_start, node_list;
@@ -131,6 +136,9 @@ struct ElementTable {
   int nindexes_max = 0;
   Array1<int> node_start;  // nelements_max + 1 entries
   Array1<int> node_list;   // nindexes_max entries
+  // Position of each element in the mesh file; empty while the table is in
+  // file order (mesh/reorder.hpp).
+  Array1<int> file_index;
   // Element -> faces in the reference element's local face order (0: no face,
   // the bed or surface side of a layered column).
   Array1<int> face_start, face_list;
@@ -264,6 +272,8 @@ inline int NodeElementCount(const NodeTable& n, int i) { return n.element_start[
 inline int NodeElement(const NodeTable& n, int i, int j) { return n.element_list[n.element_start[i] + j - 1]; }
 inline int NodeNeighbourCount(const NodeTable& n, int i) { return n.node_start[i + 1] - n.node_start[i]; }
 inline int NodeNeighbour(const NodeTable& n, int i, int j) { return n.node_list[n.node_start[i] + j - 1]; }
+// Place in the mesh file of node or element i (file_index of its table).
+inline int FileIndex(const Array1<int>& file_index, int i) { return file_index.empty() ? i : file_index[i]; }
 inline const RefElement& ElementShape(const Mesh& m, int e) { return m.shapes[m.elements.shape[e] - 1]; }
 
 // ---- shape table -----------------------------------------------------------------------
@@ -287,6 +297,9 @@ int BoundaryFaceCode(int code_a, int code_b);
 void CalcElementValues(ElementTable& elements, const NodeTable& nodes, const std::string& projection);
 void CalcFaceValues(FaceTable& faces, const ElementTable& elements, const NodeTable& nodes,
                     const std::string& projection);
+// Orders every node's element list by the element centres (needs
+// CalcElementValues).
+void OrderNodeElements(Mesh& mesh);
 void CalcNodeValues(Mesh& mesh);
 
 // Geometry of a 2D face and element in metres, as the flow sees it: on a

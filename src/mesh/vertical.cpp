@@ -352,6 +352,7 @@ void BuildLayeredMesh(const Mesh& m2, const VerticalMesh& v, Mesh& m3) {
   CreateNodeElementConnectivity(m3);
   CreateNodeNodeConnectivity(m3);
   CalcElementValues(m3.elements, m3.nodes, m3.projection);
+  OrderNodeElements(m3);
   CalcFaceValues(m3.faces, m3.elements, m3.nodes, m3.projection);
   CalcNodeValues(m3);
 }

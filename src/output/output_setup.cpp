@@ -11,6 +11,7 @@
 #include "io/units.hpp"
 #include "log/log.hpp"
 #include "mesh/interpolation.hpp"
+#include "mesh/reorder.hpp"
 #include "output/output_spec.hpp"
 
 namespace vhd {
@@ -532,10 +533,12 @@ void SetupAreaDomain(OutputSpec& spec, const Mesh& mesh, OutputList& list) {
     spec.elements.clear();
     return;
   }
+  // Written in the mesh file's order of the elements.
   spec.elements.assign(spec.compress == 1 ? count : nown);
+  const Array1<int> in_file_order = FileOrder(el.file_index, el.nelements);
   int k = 0;
-  for (int e = 1; e <= nown; ++e)
-    if (spec.compress != 1 || spec.selected[e]) spec.elements[++k] = e;
+  for (int e : in_file_order)
+    if (e <= nown && (spec.compress != 1 || spec.selected[e])) spec.elements[++k] = e;
 }
 
 void SetupOutputs(OutputList& list, const OutputModuleInfo& info, const Mesh& mesh, const RunControl& run,

@@ -5,6 +5,7 @@
 #include "log/log.hpp"
 #include "mesh/cartography.hpp"
 #include "mesh/interpolation.hpp"
+#include "mesh/reorder.hpp"
 #include "output/output_spec.hpp"
 
 namespace vhd {
@@ -14,7 +15,7 @@ namespace {
 constexpr double kRadToDeg = 57.29577951308232;
 
 // The elements written by an area output as a mesh of their own: the nodes
-// they use, in node order, numbered from 1.
+// they use, in the mesh file's order of the nodes, numbered from 1.
 ZrnMeshData SubMesh(const Mesh& mesh, const Array1<int>& elements) {
   const NodeTable& nd = mesh.nodes;
   const ElementTable& el = mesh.elements;
@@ -25,8 +26,9 @@ ZrnMeshData SubMesh(const Mesh& mesh, const Array1<int>& elements) {
     nlist += ElementNodeCount(el, e);
     for (int j = 1; j <= ElementNodeCount(el, e); ++j) renumber[ElementNode(el, e, j)] = 1;
   }
+  const Array1<int> in_file_order = FileOrder(nd.file_index, nd.nnodes);
   int nn = 0;
-  for (int n = 1; n <= nd.nnodes; ++n)
+  for (int n : in_file_order)
     if (renumber[n]) renumber[n] = ++nn;
   ZrnMeshData m;
   m.ndim = 2;

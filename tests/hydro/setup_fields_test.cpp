@@ -11,6 +11,7 @@
 #include "hydro/hd_module.hpp"
 #include "io/units.hpp"
 #include "io/zrn.hpp"
+#include "mesh/reorder.hpp"
 #include "setup_support.hpp"
 
 namespace vhd {
@@ -71,6 +72,28 @@ TEST(CoefficientFiles, ManningNumbersPerElement) {
   for (int e = 1; e <= f.hd.state.nelements; ++e) {
     EXPECT_DOUBLE_EQ(f.hd.bed.K[e], 9.81 / ((20.0 + e) * (20.0 + e))) << e;
   }
+}
+
+TEST(CoefficientFiles, RenumberedMeshTakesEachValueFromItsPlaceInTheFile) {
+  test::HdSetupFixture f;
+  // The file is written on the mesh in its file order (value 20 + place).
+  const Mesh in_file_order = Basin();
+  WriteMeshFile(f.dir.file("manning.zrnu"), in_file_order, 1, 1, 3600.0, [](int, int, int k) { return 20.0 + k; });
+  Mesh mesh;
+  GenerateRectangleMesh(test::RectSpec(6, 4, 10.0, 10.0, [](double x, double) { return -3.0 + 0.1 * x; },
+                                       CellLayout::kQuadrilaterals),
+                        mesh);
+  ReorderMesh(mesh, ElementOrder(mesh, kReorderHilbert, 1, mesh.elements.nelements));
+  SetupMeshGeometry(mesh);
+  f.Setup(Manning("format = 2\nfile_name = \"manning.zrnu\"\n"), mesh);
+  int moved = 0;
+  for (int e = 1; e <= f.hd.state.nelements; ++e) {
+    const int k = mesh.elements.file_index[e];
+    moved += k != e ? 1 : 0;
+    EXPECT_EQ(mesh.elements.xc[e], in_file_order.elements.xc[k]);
+    EXPECT_DOUBLE_EQ(f.hd.bed.K[e], 9.81 / ((20.0 + k) * (20.0 + k))) << e;
+  }
+  EXPECT_GT(moved, 0);
 }
 
 TEST(CoefficientFiles, ManningNumbersVaryingInTime) {
