@@ -63,7 +63,9 @@
 //     running into the domain and passes the discharge; where the inner
 //     element has no velocity (not wet, or below h_min) every approach
 //     writes the flux of that outer state directly (the Riemann solver
-//     against a side at rest passed half the discharge onto a dry bed);
+//     against a side at rest passed half the discharge onto a dry bed), as
+//     do approaches 1 and 3 with Riemann solvers 0 and 4, which do not
+//     return the outer flux for a single wave;
 //   - the discharge weights use the local conveyance factor 1/sqrt(K) with K
 //     the element's bed-resistance coefficient (cf = K h^(-1/3) for Manning
 //     types), 1 without bed resistance; the face value q_j = Q w_j / sum(w L)

@@ -184,27 +184,31 @@ TEST(BoundOpen, LevelBoundariesHoldALakeAtRestOffDatum) {
 
 TEST(BoundOpen, DischargeBoundaryDeliversThePrescribedVolume) {
   // 1 m3/s for 100 s through the west side of a channel whose bed falls at
-  // 1 % to the east, dry or under 1 m of water at the boundary.
+  // 1 % to the east, dry or under 1 m of water at the boundary, with every
+  // Riemann solver.
   const double Q = 1.0, T = 100.0;
-  for (int approach : {1, 2, 3}) {
-    for (double level : {0.0, 1.0}) {
-      for (CellLayout layout : kLayouts) {
-        for (int order : {1, 2}) {
-          BoundCase b;
-          b.Make(Channel(30, 4, 10.0, 10.0, [](double x, double) { return -0.01 * x; }, 2, 1, 1, 1, layout), 10.0,
-                 10,
-                 CodeSection(2, "type = 7\napproach = " + std::to_string(approach) +
-                                    "\nconstant_value = 1.0\ntype_of_soft_start = 0\n"));
-          test::SetScheme(b.c.hd, 1, order);
-          test::SetFloodDry(b.c.hd, 0.005, 0.05, 0.1);
-          b.Start([&](double, double) { return level; });
-          const double v0 = test::Volume(b.c);
-          test::RunTo(b.c, T);
-          ASSERT_GE(b.c.run_status, 0);
-          const double entered = test::Volume(b.c) - v0 - b.c.hd.flood_dry.mass_correction;
-          EXPECT_NEAR(entered / (Q * T), 1.0, 0.01)
-              << "approach " << approach << (level > 0 ? ", wet bed, " : ", dry bed, ") << LayoutName(layout)
-              << ", order " << order;
+  for (int solver : {0, 1, 2, 3, 4}) {
+    for (int approach : {1, 2, 3}) {
+      for (double level : {0.0, 1.0}) {
+        for (CellLayout layout : kLayouts) {
+          for (int order : {1, 2}) {
+            BoundCase b;
+            b.Make(Channel(30, 4, 10.0, 10.0, [](double x, double) { return -0.01 * x; }, 2, 1, 1, 1, layout), 10.0,
+                   10,
+                   CodeSection(2, "type = 7\napproach = " + std::to_string(approach) +
+                                      "\nconstant_value = 1.0\ntype_of_soft_start = 0\n"));
+            test::SetScheme(b.c.hd, solver, order);
+            test::SetFloodDry(b.c.hd, 0.005, 0.05, 0.1);
+            b.Start([&](double, double) { return level; });
+            const double v0 = test::Volume(b.c);
+            test::RunTo(b.c, T);
+            const std::string what = "solver " + std::to_string(solver) + ", approach " + std::to_string(approach) +
+                                     (level > 0 ? ", wet bed, " : ", dry bed, ") + LayoutName(layout) + ", order " +
+                                     std::to_string(order);
+            ASSERT_GE(b.c.run_status, 0) << what;
+            const double entered = test::Volume(b.c) - v0 - b.c.hd.flood_dry.mass_correction;
+            EXPECT_NEAR(entered / (Q * T), 1.0, 0.01) << what;
+          }
         }
       }
     }
