@@ -19,7 +19,9 @@
 //          from inside, the incoming one of the      by the flux), incoming
 //          inner state at the start of the run)      characteristic R- (m/s)
 //   10     level, weakly reflecting                  level, incoming
-//                                                    characteristic R- (m/s)
+//                                                    characteristic R- (m/s),
+//                                                    outgoing characteristic
+//                                                    R0 of the start (m/s)
 //   11     velocity, weakly reflecting               u, v
 //   12     Flather (level and velocity)              level, u, v[, Q (m3/s)]
 //   15     cyclic (periodic)                         partner element
@@ -48,13 +50,22 @@
 //     characteristic u_n - 2 sqrt(g h) of its inner element at the first
 //     update and forms the outer state as the weakly reflecting level (10)
 //     does: waves leave, the state of the start is the water outside;
+//   - weakly reflecting level (10): the level is the height of a simple wave
+//     that runs into the water outside, R- = R0 - 4 sqrt(g h_l), with R0 the
+//     outgoing characteristic u_n + 2 sqrt(g h) of the inner element at the
+//     first update (h_l the depth the level gives). Still water at the datum
+//     (R0 = 2 sqrt(g d)) would push a lake at rest at any other level into
+//     motion: at 1.3 m above the datum the water entered at 0.015 m/s and
+//     the level of a closed basin doubled;
 //   - discharge (7): the outer depth joins the discharge with the outgoing
 //     characteristic u_n + 2c of the inner element (the cubic of approach
 //     2), so that the Riemann solver of approaches 1 and 3 sees one wave
 //     running into the domain and passes the discharge; where the inner
 //     element has no velocity (not wet, or below h_min) every approach
 //     writes the flux of that outer state directly (the Riemann solver
-//     against a side at rest passed half the discharge onto a dry bed);
+//     against a side at rest passed half the discharge onto a dry bed), as
+//     do approaches 1 and 3 with Riemann solvers 0 and 4, which do not
+//     return the outer flux for a single wave;
 //   - the discharge weights use the local conveyance factor 1/sqrt(K) with K
 //     the element's bed-resistance coefficient (cf = K h^(-1/3) for Manning
 //     types), 1 without bed resistance; the face value q_j = Q w_j / sum(w L)

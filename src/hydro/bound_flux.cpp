@@ -235,12 +235,16 @@ void BoundaryFaceFluxHD(HdModule& hd, HdSolver& s, const Mesh& mesh, const Bound
       // would see a side at rest and pass about half the discharge), write
       // the flux of that state directly; approaches 1 and 3 otherwise pass it
       // to the Riemann solver, which then has a single wave running into the
-      // domain and passes the outer flux.
+      // domain and passes the outer flux. The central flux (solver 0) would
+      // pass the mean of the inner and the outer flux, and the two-rarefaction
+      // star state of solver 4 misses the outer state where the wave into
+      // the domain is a bore: with those the flux is written directly too.
       const double q = OldValue(fc, 1);  // per unit width, into the domain
       const double cb = DischargeCelerity(q, un + 2.0 * cel, g);
       const double hb = cb * cb / g;
       const double unb = hb > 0.0 ? -q / hb : 0.0;
-      if (fc.approach == 2 || !wet || h < h_min) {
+      const bool single_wave = sol.type_of_Riemann_solver >= 1 && sol.type_of_Riemann_solver <= 3;
+      if (fc.approach == 2 || !single_wave || !wet || h < h_min) {
         const double utb = (unb > 0.0 || fc.type_secondary == 3) ? ut : 0.0;
         F = DirectFlux(hb, unb, utb, d, k, nx, ny, len, g);
         riemann = false;

@@ -64,8 +64,10 @@ double FaceStillWaterDepth(const Mesh& mesh, int f) {
 
 int NumberOfValues(const BoundaryCondition& b) {
   switch (b.type) {
-    case kBcVelocity: case kBcFlux: case kBcTransmissive: case kBcLevelWeak: case kBcVelocityWeak:
+    case kBcVelocity: case kBcFlux: case kBcTransmissive: case kBcVelocityWeak:
       return 4;
+    case kBcLevelWeak:
+      return 6;
     case kBcFlather:
       return b.type_interpolation_constrain >= 1 ? 8 : 6;
     default:

@@ -55,17 +55,20 @@ void AddToLevel(const HdState& st, HdBoundary& bc, const BoundaryCondition& b, c
   }
 }
 
-// Incoming characteristic of a weakly reflecting level boundary: the simple
-// wave that enters still water of depth d with the level h_l - d.
-double IncomingCharacteristic(double level, double d, double g) {
-  const double hl = std::max(0.0, level + d);
-  return 2.0 * std::sqrt(g * std::max(0.0, d)) - 4.0 * std::sqrt(g * hl);
+// Incoming characteristic of a weakly reflecting level boundary: that of the
+// simple wave which runs into the water of outgoing characteristic R0 and
+// brings it to the depth h_l that the level gives over the still water depth
+// d: R- = R0 - 4 sqrt(g h_l). Water at rest at that depth meets it with
+// R0 = 2 sqrt(g h_l), so a lake at rest at the level stays at rest.
+double IncomingCharacteristic(double R0, double level, double d, double g) {
+  return R0 - 4.0 * std::sqrt(g * std::max(0.0, level + d));
 }
 
-// Incoming characteristic u_n - 2 sqrt(g h) of the inner element of a face
-// (u_n outward; velocity 0 where the element is not wet or below h_min), at
-// the depth over the face's still water depth.
-double InnerIncomingCharacteristic(const HdModule& hd, const Mesh& mesh, const BoundaryFaceCondition& fc) {
+// Characteristics u_n -+ 2 sqrt(g h) of the inner element of a face (u_n
+// outward; velocity 0 where the element is not wet or below h_min), at the
+// depth over the face's still water depth.
+void InnerCharacteristics(const HdModule& hd, const Mesh& mesh, const BoundaryFaceCondition& fc, double& Rminus,
+                          double& Rplus) {
   const HdState& st = hd.state;
   const int c = fc.element;
   const double h = std::max(0.0, st.eta[c] + StillDepth(st, fc));
@@ -73,7 +76,9 @@ double InnerIncomingCharacteristic(const HdModule& hd, const Mesh& mesh, const B
   if (st.wetdry[c] == kWet && st.h[c] >= hd.flood_dry.mass_depth && st.h[c] > 0) {
     un = (st.P[c] * mesh.faces.nx[fc.face] + st.Q[c] * mesh.faces.ny[fc.face]) / st.h[c];
   }
-  return un - 2.0 * std::sqrt(kPhysical.g * h);
+  const double c2 = 2.0 * std::sqrt(kPhysical.g * h);
+  Rminus = un - c2;
+  Rplus = un + c2;
 }
 
 }  // namespace
@@ -101,18 +106,24 @@ void UpdateBoundaryValuesHD(HdModule& hd, const Mesh& mesh, double t) {
     TiltLevelHD(hd, mesh, b);
     ConstrainFlatherHD(hd, mesh, b);
     CorrectRadiationStressHD(hd, mesh, b);
-    if (b.type == kBcTransmissive && !bc.filled) {
+    if ((b.type == kBcTransmissive || b.type == kBcLevelWeak) && !bc.filled) {
+      // The water outside is the inner state of the start of the run: its
+      // incoming characteristic (transmissive) or its outgoing one, which the
+      // waves of the prescribed level run into (weakly reflecting level).
       for (int j = 1; j <= b.nfaces; ++j) {
         BoundaryFaceCondition& fc = bc.faces[b.first_face + j - 1];
-        OldValue(fc, 2) = NewValue(fc, 2) = InnerIncomingCharacteristic(hd, mesh, fc);
+        double Rminus, Rplus;
+        InnerCharacteristics(hd, mesh, fc, Rminus, Rplus);
+        const int k = b.type == kBcTransmissive ? 2 : 3;
+        OldValue(fc, k) = NewValue(fc, k) = b.type == kBcTransmissive ? Rminus : Rplus;
       }
     }
     if (b.type == kBcLevelWeak) {
       for (int j = 1; j <= b.nfaces; ++j) {
         BoundaryFaceCondition& fc = bc.faces[b.first_face + j - 1];
-        const double d = StillDepth(st, fc);
-        OldValue(fc, 2) = IncomingCharacteristic(OldValue(fc, 1), d, g);
-        NewValue(fc, 2) = IncomingCharacteristic(NewValue(fc, 1), d, g);
+        const double d = StillDepth(st, fc), R0 = OldValue(fc, 3);
+        OldValue(fc, 2) = IncomingCharacteristic(R0, OldValue(fc, 1), d, g);
+        NewValue(fc, 2) = IncomingCharacteristic(R0, NewValue(fc, 1), d, g);
       }
     }
   }
