@@ -3,7 +3,6 @@
 #include <gtest/gtest.h>
 
 #include <fstream>
-#include <sstream>
 #include <string>
 #include <vector>
 
@@ -11,13 +10,6 @@
 
 namespace vhd {
 namespace {
-
-std::vector<std::string> Lines(const std::string& path) {
-  std::istringstream in(test::ReadTextFile(path));
-  std::vector<std::string> lines;
-  for (std::string line; std::getline(in, line);) lines.push_back(line);
-  return lines;
-}
 
 TEST(ProgressChannel, ModeFromEnvironment) {
   EXPECT_EQ(ProgressModeFromEnvironment(nullptr), ProgressMode::File);
@@ -106,7 +98,7 @@ TEST(ProgressChannel, MessageFileRecords) {
       "PROGRE 1000",
       "TIMLFT 0",
   };
-  EXPECT_EQ(Lines(dir.file("run._spi_")), expected);
+  EXPECT_EQ(test::SplitLines(test::ReadTextFile(dir.file("run._spi_"))), expected);
 }
 
 TEST(ProgressChannel, KillFileStopsAndStaysSeen) {

@@ -24,12 +24,6 @@ TEST(ThreadCount, RequestIsBoundedByProcessorsAndMaximum) {
   EXPECT_EQ(ThreadCountFor(10, limited), 3);
 }
 
-TEST(ThreadCount, SetThreadCountStoresTheCount) {
-  RunControl run;
-  SetThreadCount(-1, ComputeResources{1, 1}, run);
-  EXPECT_EQ(run.nthreads, 1);
-}
-
 TEST(DateTime, StepTimesCrossDaysMonthsAndLeapYears) {
   const DateTime start{2004, 2, 28, 23, 59, 0};
   EXPECT_EQ(FormatDateTime(AddSeconds(start, 0.0)), "2004-02-28 23:59:00");

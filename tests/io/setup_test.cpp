@@ -4,7 +4,6 @@
 #include <gtest/gtest.h>
 
 #include <cstdlib>
-#include <sstream>
 #include <string>
 #include <vector>
 
@@ -14,13 +13,6 @@
 
 namespace vhd {
 namespace {
-
-std::vector<std::string> Lines(const std::string& text) {
-  std::vector<std::string> lines;
-  std::istringstream in(text);
-  for (std::string line; std::getline(in, line);) lines.push_back(line);
-  return lines;
-}
 
 // A message as one text: its first line and the continuation lines that
 // follow it, each without its indent.
@@ -77,11 +69,7 @@ protected:
     SktClose();
     CloseLogFile();
   }
-  std::vector<std::string> Body() {
-    std::vector<std::string> lines = Lines(test::ReadTextFile(log_path));
-    lines.erase(lines.begin(), lines.begin() + std::min<std::size_t>(2, lines.size()));
-    return lines;
-  }
+  std::vector<std::string> Body() { return test::LogBody(log_path); }
   test::TempDir dir;
   std::string setup_path = dir.file("model.toml");
   std::string log_path = dir.file("model.log");
@@ -350,7 +338,7 @@ TEST_F(SetupTest, UnreadableFileAndSyntaxError) {
         SktOpenFile(setup_path, true);
       },
       testing::ExitedWithCode(1), "");
-  const std::vector<std::string> lines = Lines(test::ReadTextFile(out));
+  const std::vector<std::string> lines = test::SplitLines(test::ReadTextFile(out));
   ASSERT_EQ(lines.size(), 4u);
   const std::string text = Unwrap(lines, 1, 14);
   EXPECT_EQ(text.rfind(" Fatal error: Error while parsing", 0), 0u) << text;

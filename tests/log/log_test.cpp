@@ -5,7 +5,6 @@
 
 #include <cstdio>
 #include <cstdlib>
-#include <sstream>
 #include <string>
 #include <vector>
 
@@ -15,13 +14,6 @@
 namespace vhd {
 namespace {
 
-std::vector<std::string> Lines(const std::string& text) {
-  std::vector<std::string> lines;
-  std::istringstream in(text);
-  for (std::string line; std::getline(in, line);) lines.push_back(line);
-  return lines;
-}
-
 // A log in a fresh folder; Body() gives its lines after the two header lines.
 class LogTest : public ::testing::Test {
 protected:
@@ -30,11 +22,7 @@ protected:
     ASSERT_TRUE(OpenLogFile(log_path));
   }
   void TearDown() override { CloseLogFile(); }
-  std::vector<std::string> Body() {
-    std::vector<std::string> lines = Lines(test::ReadTextFile(log_path));
-    lines.erase(lines.begin(), lines.begin() + std::min<std::size_t>(2, lines.size()));
-    return lines;
-  }
+  std::vector<std::string> Body() { return test::LogBody(log_path); }
   test::TempDir dir;
   std::string log_path = dir.file("model.log");
 };
@@ -48,7 +36,7 @@ TEST(LogFileName, ProcessIdsAndExtensions) {
 }
 
 TEST_F(LogTest, HeaderHoldsDateAndTime) {
-  const std::vector<std::string> lines = Lines(test::ReadTextFile(log_path));
+  const std::vector<std::string> lines = test::SplitLines(test::ReadTextFile(log_path));
   ASSERT_GE(lines.size(), 2u);
   ASSERT_EQ(lines[0].size(), 68u);
   ASSERT_EQ(lines[1].size(), 66u);

@@ -2,7 +2,6 @@
 
 #include <gtest/gtest.h>
 
-#include <sstream>
 #include <string>
 #include <vector>
 
@@ -19,11 +18,7 @@ protected:
   void TearDown() override { CloseLogFile(); }
   std::vector<std::string> Body() {
     CloseLogFile();
-    std::vector<std::string> lines;
-    std::istringstream in(test::ReadTextFile(log));
-    for (std::string line; std::getline(in, line);) lines.push_back(line);
-    lines.erase(lines.begin(), lines.begin() + 2);
-    return lines;
+    return test::LogBody(log);
   }
   test::TempDir dir;
   std::string log = dir.file("t.log");

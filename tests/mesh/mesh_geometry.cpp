@@ -127,15 +127,6 @@ TEST(Faces, LongLatElementAcrossTheDateLineIsSmall) {
   EXPECT_NEAR(std::abs(m.faces.xf[1]), M_PI, 1e-12);
 }
 
-TEST(Faces, BoundaryFaceCodeRule) {
-  EXPECT_EQ(BoundaryFaceCode(0, 0), 1);  // unmarked boundary: land
-  EXPECT_EQ(BoundaryFaceCode(1, 1), 1);
-  EXPECT_EQ(BoundaryFaceCode(0, 3), 3);
-  EXPECT_EQ(BoundaryFaceCode(1, 2), 2);  // land meets open: the open boundary
-  EXPECT_EQ(BoundaryFaceCode(2, 1), 2);
-  EXPECT_EQ(BoundaryFaceCode(3, 2), 3);  // two open boundaries: the higher code
-}
-
 TEST(Faces, HoleOnTheSideTakesTheLowerCodeAtItsCorners) {
   // A notch cut into the open west boundary: its rim is land, and the open
   // boundary keeps the two faces on either side of the notch.
@@ -283,17 +274,6 @@ INSTANTIATE_TEST_SUITE_P(
                     Case{"holes", Spec(CellLayout::kMixed, 100, 130, 0.2,
                                        {{0.0, 200.0, 1200.0, 1500.0}, {500.0, 1300.0, 1800.0, 1900.0}})}),
     [](const testing::TestParamInfo<Case>& info) { return std::string(info.param.name); });
-
-TEST(GeneratedMeshLarge, MillionJitteredTrianglesWithHoles) {
-  RectangleMeshSpec s = Spec(CellLayout::kRandomTriangles, 800, 650, 0.2,
-                             {{0.0, 500.0, 1300.0, 1500.0}, {1000.0, 1500.0, 2000.0, 2100.0}});
-  Mesh m;
-  GenerateRectangleMesh(s, m);
-  ASSERT_EQ(m.elements.nelements, 980000);
-  SetupMeshGeometry(m);
-  CheckProperties(s, m, false);
-  CheckBoundaryCodes(s, m);
-}
 
 TEST(Generator, SameSeedSameMeshOtherSeedOtherMesh) {
   RectangleMeshSpec s = Spec(CellLayout::kMixed, 20, 20, 0.2, {});

@@ -86,31 +86,6 @@ TEST(ShapeTable, DistinctShapesAreSharedAndLimited) {
       "Type not supported for element 1");
 }
 
-TEST(ShapeTable, CountsOfEveryType) {
-  struct Row {
-    int type, nnodes, nedges, nodes_per_edge, nfaces, nodes_per_face;
-  };
-  const Row rows[] = {{11, 2, 1, 2, 0, 0}, {12, 3, 1, 2, 0, 0}, {21, 3, 3, 2, 0, 0}, {22, 4, 3, 2, 0, 0},
-                      {23, 6, 3, 3, 0, 0}, {24, 7, 3, 3, 0, 0}, {25, 4, 4, 2, 0, 0}, {26, 5, 4, 2, 0, 0},
-                      {27, 8, 4, 3, 0, 0}, {28, 9, 4, 3, 0, 0}, {31, 4, 6, 2, 4, 3}, {32, 6, 9, 2, 5, 4},
-                      {33, 8, 12, 2, 6, 4}, {41, 1, 0, 0, 0, 0}, {42, 1, 0, 0, 0, 0}, {43, 1, 0, 0, 0, 0}};
-  for (const Row& r : rows) {
-    int dim = 0, shape = 0, ftype = 0;
-    ASSERT_TRUE(ElementTypeInfo(r.type, dim, shape, ftype));
-    RefElement ref;
-    SetRefElement(dim, shape, ftype, ref);
-    EXPECT_EQ(ref.nnodes, r.nnodes) << r.type;
-    EXPECT_EQ(ref.nedges, r.nedges) << r.type;
-    EXPECT_EQ(ref.nodes_per_edge, r.nodes_per_edge) << r.type;
-    EXPECT_EQ(ref.nfaces, r.nfaces) << r.type;
-    EXPECT_EQ(ref.nodes_per_face, r.nodes_per_face) << r.type;
-    EXPECT_EQ(static_cast<int>(ref.edge_nodes.size()), r.nedges * r.nodes_per_edge);
-    EXPECT_EQ(static_cast<int>(ref.face_nodes.size()), r.nfaces * r.nodes_per_face);
-  }
-  int dim = 0, shape = 0, ftype = 0;
-  EXPECT_FALSE(ElementTypeInfo(29, dim, shape, ftype));
-}
-
 // Reference node coordinates of the 2D shapes (triangle (0,0),(1,0),(0,1);
 // square [-1,1]^2), in local node order.
 std::vector<std::array<double, 2>> ReferenceNodes(int type) {

@@ -4,7 +4,6 @@
 // the outputs under test, and the HD solver for runs that need face fluxes.
 
 #include <cmath>
-#include <cstdlib>
 #include <functional>
 #include <string>
 
@@ -123,14 +122,5 @@ public:
   HdOutputs out;
   int status = 0;
 };
-
-// Runs Debian's Python on a script text with arguments; returns the exit code.
-inline int RunPython(const TempDir& dir, const std::string& script, const std::string& args) {
-  const std::string path = dir.file("check.py");
-  WriteTextFile(path, script);
-  const std::string cmd = "/usr/bin/python3 " + path + " " + args + " > " + dir.file("python.txt") + " 2>&1";
-  const int rc = std::system(cmd.c_str());
-  return WIFEXITED(rc) ? WEXITSTATUS(rc) : -1;
-}
 
 }  // namespace vhd::test
