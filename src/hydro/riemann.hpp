@@ -83,6 +83,13 @@ inline RiemannFlux RiemannFaceFluxUnit(const RiemannSide& L, const RiemannSide& 
                                        double nn, double h_min, int solver, int entropy_fix, double length,
                                        double g, double sqrt_g);
 
+// Roe's flux of type 1 without its HLL fallback, for faces where the caller
+// knows that the fallback is not taken (both sides wet, deeper than 1e-10 m,
+// h_L + h_R > h_min): the same bits as RiemannFaceFluxUnit of type 1 there,
+// without forming the HLL flux beside it.
+inline RiemannFlux RoeOnlyFaceFluxUnit(const RiemannSide& L, const RiemannSide& R, double ex, double ey, double nn,
+                                       int entropy_fix, double length, double g, double sqrt_g);
+
 // ---- the solvers, in the frame of the unit normal -----------------------------
 //
 // Each returns the mass flux, the normal and the tangential momentum flux per
@@ -268,6 +275,24 @@ inline FrameFlux HllcMeanPressureFlux(const SideFrame& L, const SideFrame& R) {
   return SelectFlux(SL >= 0, PhysicalFlux(L), SelectFlux(SR <= 0, PhysicalFlux(R), star));
 }
 
+// Whether the Roe solver (type 1) takes the HLL flux at a face: a side
+// dry for the HLL family, or h_L + h_R <= h_min.
+inline bool RoeTakesHll(const SideFrame& L, const SideFrame& R, double h_min) {
+  return L.h + R.h <= h_min || L.dry || R.dry;
+}
+
+// Back to x, y and to the length of the (possibly scaled) normal.
+inline RiemannFlux FaceFluxFromFrame(const FrameFlux& f, double ex, double ey, double nn, double length) {
+  const double scale = nn * length;
+  RiemannFlux out;
+  out.Fh = f.mass * nn;
+  out.mass = f.mass * scale;
+  out.momx = (f.mn * ex - f.mt * ey) * scale;
+  out.momy = (f.mn * ey + f.mt * ex) * scale;
+  out.d = f.d;
+  return out;
+}
+
 [[gnu::always_inline]] inline RiemannFlux RiemannFaceFluxUnit(const RiemannSide& L, const RiemannSide& R,
                                                                double ex, double ey, double nn, double h_min,
                                                                int solver, int entropy_fix, double length,
@@ -277,22 +302,22 @@ inline FrameFlux HllcMeanPressureFlux(const SideFrame& L, const SideFrame& R) {
   FrameFlux f;
   switch (solver) {
     case 1:
-      f = SelectFlux(L.h + R.h <= h_min || fl.dry || fr.dry, HllFlux(fl, fr), RoeFlux(fl, fr, entropy_fix, g));
+      f = SelectFlux(RoeTakesHll(fl, fr, h_min), HllFlux(fl, fr), RoeFlux(fl, fr, entropy_fix, g));
       break;
     case 2: f = HllFlux(fl, fr); break;
     case 3: f = HllcFlux(fl, fr, g); break;
     case 4: f = HllcMeanPressureFlux(fl, fr); break;
     default: f = CentralFlux(fl, fr); break;
   }
-  // Back to x, y and to the length of the (possibly scaled) normal.
-  const double scale = nn * length;
-  RiemannFlux out;
-  out.Fh = f.mass * nn;
-  out.mass = f.mass * scale;
-  out.momx = (f.mn * ex - f.mt * ey) * scale;
-  out.momy = (f.mn * ey + f.mt * ex) * scale;
-  out.d = f.d;
-  return out;
+  return FaceFluxFromFrame(f, ex, ey, nn, length);
+}
+
+[[gnu::always_inline]] inline RiemannFlux RoeOnlyFaceFluxUnit(const RiemannSide& L, const RiemannSide& R, double ex,
+                                                               double ey, double nn, int entropy_fix, double length,
+                                                               double g, double sqrt_g) {
+  const SideFrame fl = MakeSideFrame(L, ex, ey, g, sqrt_g);
+  const SideFrame fr = MakeSideFrame(R, ex, ey, g, sqrt_g);
+  return FaceFluxFromFrame(RoeFlux(fl, fr, entropy_fix, g), ex, ey, nn, length);
 }
 
 inline RiemannFlux RiemannFaceFlux(const RiemannSide& L, const RiemannSide& R, double nx, double ny,
