@@ -16,7 +16,9 @@
 // meshes; on geographic meshes the normal carries metric factors).
 //
 // Solver types (type_of_Riemann_solver):
-//   0 central flux, no dissipation
+//   0 central flux, no dissipation; the HLL flux (type 2) when a side is
+//     dry or h_L + h_R <= h_min, as with type 1: without dissipation a
+//     front running onto a dry bed blows up
 //   1 Roe with optional entropy fix; the HLL flux (type 2) when a side is
 //     dry or h_L + h_R <= h_min: the central flux there has no dissipation,
 //     and at thin fronts on steep slopes it flung films out at hundreds of
@@ -200,9 +202,12 @@ inline FrameFlux RoeFlux(const SideFrame& L, const SideFrame& R, int entropy_fix
   return {central.mass - 0.5 * Dh, central.mn - 0.5 * Dn, central.mt - 0.5 * Dt, central.d};
 }
 
-// Two-rarefaction estimates of the outer wave speeds (Toro).
+// Two-rarefaction estimates of the outer wave speeds (Toro). The sums are
+// grouped so that swapping the sides (and the normal) negates each speed to
+// the last bit: a face's flux then does not depend on which of its elements
+// is numbered first.
 inline void TwoRarefactionSpeeds(const SideFrame& L, const SideFrame& R, double& SL, double& SR, double& ustar) {
-  ustar = 0.5 * (L.un + R.un) + L.c - R.c;
+  ustar = 0.5 * (L.un + R.un) + (L.c - R.c);
   const double cstar = 0.25 * (L.un - R.un) + 0.5 * (L.c + R.c);
   SL = L.dry ? R.un - 2.0 * R.c : std::min(L.un - L.c, ustar - cstar);
   SR = R.dry ? L.un + 2.0 * L.c : std::max(R.un + R.c, ustar + cstar);
@@ -275,8 +280,13 @@ inline FrameFlux HllcMeanPressureFlux(const SideFrame& L, const SideFrame& R) {
   return SelectFlux(SL >= 0, PhysicalFlux(L), SelectFlux(SR <= 0, PhysicalFlux(R), star));
 }
 
-// Whether the Roe solver (type 1) takes the HLL flux at a face: a side
-// dry for the HLL family, or h_L + h_R <= h_min.
+// Whether a solver type without a dry-front speed of its own (the central
+// flux and Roe: every type but 2, 3 and 4) takes the HLL flux at dry sides
+// and over thin water.
+inline bool HllAtDryFronts(int solver) { return solver < 2 || solver > 4; }
+
+// Whether such a solver takes the HLL flux at a face: a side dry for the
+// HLL family, or h_L + h_R <= h_min.
 inline bool RoeTakesHll(const SideFrame& L, const SideFrame& R, double h_min) {
   return L.h + R.h <= h_min || L.dry || R.dry;
 }
@@ -307,7 +317,7 @@ inline RiemannFlux FaceFluxFromFrame(const FrameFlux& f, double ex, double ey, d
     case 2: f = HllFlux(fl, fr); break;
     case 3: f = HllcFlux(fl, fr, g); break;
     case 4: f = HllcMeanPressureFlux(fl, fr); break;
-    default: f = CentralFlux(fl, fr); break;
+    default: f = SelectFlux(RoeTakesHll(fl, fr, h_min), HllFlux(fl, fr), CentralFlux(fl, fr)); break;
   }
   return FaceFluxFromFrame(f, ex, ey, nn, length);
 }

@@ -247,14 +247,14 @@ inline double SurfaceBelowBed(double h, double d, double d_top) { return std::ma
 // Whether both sides are deep enough at the face for the batched flux, and
 // each side's surface lies at or above the higher of the two beds seen at the
 // face (else the face takes the hydrostatic reconstruction of
-// InteriorFaceTerms). With the Roe solver the faces over thin water
-// (h_L + h_R <= h_min), where it takes the HLL flux, go to InteriorFaceTerms
-// too, so that the batch forms Roe's flux alone.
+// InteriorFaceTerms). With the central and Roe solvers the faces over thin
+// water (h_L + h_R <= h_min), where they take the HLL flux, go to
+// InteriorFaceTerms too, so that the batch forms their own flux alone.
 inline bool PlainFaceDepths(const FaceLoopInput& in, double hl, double dl, double hr, double dr) {
   const double top = std::min(dl, dr);
   return hl >= in.h_move && hr >= in.h_move && hl > riemann_detail::kDryDepth && hr > riemann_detail::kDryDepth &&
          SurfaceBelowBed(hl, dl, top) == 0.0 && SurfaceBelowBed(hr, dr, top) == 0.0 &&
-         (in.solver != 1 || hl + hr > in.h_min);
+         (!HllAtDryFronts(in.solver) || hl + hr > in.h_min);
 }
 
 // Face values a, c of one field on the two sides of a face from the centre

@@ -185,11 +185,15 @@ TEST(BoundOpen, LevelBoundariesHoldALakeAtRestOffDatum) {
 TEST(BoundOpen, DischargeBoundaryDeliversThePrescribedVolume) {
   // 1 m3/s for 100 s through the west side of a channel whose bed falls at
   // 1 % to the east, dry or under 1 m of water at the boundary, with every
-  // Riemann solver.
+  // Riemann solver. The central flux (type 0) runs onto the dry bed only:
+  // without dissipation a disturbance on the wet channel of right triangles
+  // grows at first order until the blow-up check stops the run, whatever the
+  // boundary does.
   const double Q = 1.0, T = 100.0;
   for (int solver : {0, 1, 2, 3, 4}) {
     for (int approach : {1, 2, 3}) {
       for (double level : {0.0, 1.0}) {
+        if (solver == 0 && level > 0) continue;
         for (CellLayout layout : kLayouts) {
           for (int order : {1, 2}) {
             BoundCase b;
