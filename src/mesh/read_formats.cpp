@@ -288,19 +288,22 @@ void ReadMeshBasicGeo(Mesh& mesh, const std::string& file_name) {
   int nvertices = 0;
   while (in.NextNonBlank()) {
     const auto f = in.Fields();
-    const std::string key = LowerCase(f[0]);
+    // The fields view the current line: the keyword is copied before the
+    // next line is read.
+    const std::string word(f[0]);
+    const std::string key = LowerCase(word);
     if (key == "end") break;
     if (key == "vertices" || key == "triangles" || key == "quadrilaterals") {
       int n = 0;
       if (f.size() > 1) {
-        in.Ints(std::string(f[0]) + " needs a count", 1, 1, &n);
+        in.Ints(word + " needs a count", 1, 1, &n);
       } else {
-        in.Require(std::string(f[0]) + " count expected");
-        in.Ints(std::string(f[0]) + " needs a count", 0, 1, &n);
+        in.Require(word + " count expected");
+        in.Ints(word + " needs a count", 0, 1, &n);
       }
       if (n < 0) in.Fail("Negative count");
       for (int k = 0; k < n; ++k) {
-        in.Require(std::string(f[0]) + " line expected");
+        in.Require(word + " line expected");
         if (key == "vertices") {
           double xyz[3];
           int code = 0;
@@ -316,7 +319,7 @@ void ReadMeshBasicGeo(Mesh& mesh, const std::string& file_name) {
         }
       }
     } else if (!cards.Take(in)) {
-      in.Fail("Unknown keyword " + std::string(f[0]));
+      in.Fail("Unknown keyword " + word);
     }
   }
   b.Build(mesh, cards.projection);
