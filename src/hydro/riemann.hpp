@@ -287,7 +287,7 @@ inline bool HllAtDryFronts(int solver) { return solver < 2 || solver > 4; }
 
 // Whether such a solver takes the HLL flux at a face: a side dry for the
 // HLL family, or h_L + h_R <= h_min.
-inline bool RoeTakesHll(const SideFrame& L, const SideFrame& R, double h_min) {
+inline bool FaceTakesHll(const SideFrame& L, const SideFrame& R, double h_min) {
   return L.h + R.h <= h_min || L.dry || R.dry;
 }
 
@@ -312,12 +312,12 @@ inline RiemannFlux FaceFluxFromFrame(const FrameFlux& f, double ex, double ey, d
   FrameFlux f;
   switch (solver) {
     case 1:
-      f = SelectFlux(RoeTakesHll(fl, fr, h_min), HllFlux(fl, fr), RoeFlux(fl, fr, entropy_fix, g));
+      f = SelectFlux(FaceTakesHll(fl, fr, h_min), HllFlux(fl, fr), RoeFlux(fl, fr, entropy_fix, g));
       break;
     case 2: f = HllFlux(fl, fr); break;
     case 3: f = HllcFlux(fl, fr, g); break;
     case 4: f = HllcMeanPressureFlux(fl, fr); break;
-    default: f = SelectFlux(RoeTakesHll(fl, fr, h_min), HllFlux(fl, fr), CentralFlux(fl, fr)); break;
+    default: f = SelectFlux(FaceTakesHll(fl, fr, h_min), HllFlux(fl, fr), CentralFlux(fl, fr)); break;
   }
   return FaceFluxFromFrame(f, ex, ey, nn, length);
 }
