@@ -40,17 +40,6 @@ void WriteCompletion(int run_status) {
     WriteLogLine("  Abnormal run completion");
 }
 
-// Until the mesh is split over the processes, every process would compute
-// the whole mesh, and every sum over processes (volume balance, budgets,
-// boundary discharges) would come out multiplied by the process count. Such
-// a run stops at start, on every process, with the log already written.
-void RefuseSeveralProcesses(const RunControl& run) {
-  if (run.nprocesses <= 1) return;
-  FatalError("RunVantorHD: Runs on several processes (" + std::to_string(run.nprocesses) +
-             ") are not available in this build (the mesh is not split over the processes): "
-             "run on one process, with threads (OMP_NUM_THREADS)");
-}
-
 }  // namespace
 
 int RunVantorHD(int argc, char** argv) {
@@ -70,7 +59,6 @@ int RunVantorHD(int argc, char** argv) {
   if (status != 0) StopRun(run.program_path + ": Unable to open " + run.setup_file);
   run.log_file = LogFileName(run.setup_file, run.process_id);
   WriteComputingEnvironment(run, resources.max_threads, resources.nprocessors);
-  RefuseSeveralProcesses(run);
   SktOpenTarget(kTargetName);
 
   SetThreadCount(2, resources, run);
@@ -95,7 +83,8 @@ int RunVantorHD(int argc, char** argv) {
   ReadTimeSection(time, run);
   ModuleSelection selection;
   Domain domain;
-  SetupDomain(run, domain, selection);
+  Subdomain subdomain;
+  SetupDomain(run, domain, selection, subdomain);
   StopIfSignalled();
   ReadModuleSelection(selection);
 
@@ -104,7 +93,7 @@ int RunVantorHD(int argc, char** argv) {
   SetThreadCount(nthreads, resources, run);
 
   ModuleSet modules;
-  SetupModules(modules, ModuleContext{run, time, selection, domain});
+  SetupModules(modules, ModuleContext{run, time, selection, domain, subdomain});
   SktReportUnusedKeywords();
   StopIfSignalled();
 

@@ -10,6 +10,7 @@ namespace vhd {
 void HdDriverModule::Setup(const ModuleContext& context) {
   std::vector<const Mesh*> meshes;
   for (const DomainMesh& dm : context.domain.meshes) meshes.push_back(&dm.mesh);
+  hd_.subdomain = &context.subdomain;
   SetupHD(hd_, context.run, context.time, context.selection, meshes);
   mesh_ = meshes[static_cast<std::size_t>(hd_.number_of_2D_mesh_velocity - 1)];
   run_ = &context.run;

@@ -18,6 +18,7 @@
 
 #include "core/run.hpp"
 #include "mesh/domain.hpp"
+#include "parallel/subdomain.hpp"
 
 namespace vhd {
 
@@ -48,6 +49,7 @@ struct ModuleContext {
   const TimeAxis& time;
   const ModuleSelection& selection;
   Domain& domain;  // the meshes of this process
+  Subdomain& subdomain;  // this process's part of the 2D mesh
 };
 
 class Module {

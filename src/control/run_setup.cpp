@@ -100,12 +100,22 @@ void ReadModuleSelection(ModuleSelection& s) {
   if (s.hd <= 0) FatalError("The Hydrodynnamic module must be included");
 }
 
-void SetupDomain(const RunControl& run, Domain& domain, ModuleSelection& selection) {
-  // Until the partitioned domain setup is part of the build, every process of
-  // a run on several processes reads and keeps the whole mesh.
-  if (run.nprocesses > 1)
-    Warning("The domain is not partitioned in this build: every process holds the whole mesh");
+void SetupDomain(const RunControl& run, Domain& domain, ModuleSelection& selection, Subdomain& sub) {
   SetupSpaceDiscretization(domain, selection);
+  Mesh& mesh = domain.meshes[0].mesh;
+  if (run.nprocesses <= 1) {
+    SetupSubdomain(mesh, Array1<int>(), 2, run, sub);
+    return;
+  }
+  if (domain.number_of_meshes != 1 || domain.number_of_dimensions != 2 || mesh.ndim != 2)
+    FatalError("SetupDomain: a run on several processes needs one 2D mesh (number_of_meshes 1, "
+               "number_of_dimensions 2)");
+  const int ne = mesh.elements.nelements;
+  Array1<int> part(ne, 1);
+  for (int e = 1; e <= ne; ++e)
+    part[e] = 1 + static_cast<int>(static_cast<long long>(e - 1) * run.nprocesses / ne);
+  SetupSubdomain(mesh, part, 2, run, sub);
+  PrintMeshSummary(mesh, 0, true);
 }
 
 }  // namespace vhd

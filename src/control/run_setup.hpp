@@ -4,6 +4,7 @@
 
 #include "core/run.hpp"
 #include "mesh/domain.hpp"
+#include "parallel/subdomain.hpp"
 
 namespace vhd {
 
@@ -29,6 +30,8 @@ void ReadTimeSection(TimeAxis& time, const RunControl& run);
 // Section MODULE_SELECTION.
 void ReadModuleSelection(ModuleSelection& selection);
 // The domain and its meshes (section DOMAIN); sets the run dimension.
-void SetupDomain(const RunControl& run, Domain& domain, ModuleSelection& selection);
+// Reads the domain and its meshes; with several processes, splits the 2D
+// mesh over them (parallel/subdomain.hpp) into sub.
+void SetupDomain(const RunControl& run, Domain& domain, ModuleSelection& selection, Subdomain& sub);
 
 }  // namespace vhd

@@ -181,10 +181,6 @@ void ChooseTiltingPoint(const HdModule& hd, const Mesh& mesh, BoundaryCondition&
     FatalError("SetupBoundCondHD: Only one section allowed when coriolis/wind correction is included (" +
                CodeSection(b.code) + " has " + std::to_string(b.nsections) + " sections)");
   }
-  if (hd.nprocesses > 1) {
-    FatalError("SetupBoundCondHD: level tilting (" + CodeSection(b.code) +
-               ") is not available in a message-passing run");
-  }
   if (b.type_of_tilting != 1) {
     FatalError("Type not supported for level tilting: type_of_tilting " + std::to_string(b.type_of_tilting) +
                " in " + CodeSection(b.code) + " (only 1 is available)");

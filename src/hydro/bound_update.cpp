@@ -31,6 +31,22 @@ double StillDepth(const HdState& st, const BoundaryFaceCondition& fc) {
 
 bool Owned(const HdState& st, const BoundaryFaceCondition& fc) { return fc.element <= st.nelements_owned; }
 
+// The total over the processes of a sum over the owned faces.
+double Total(ExactSum part, const HdModule& hd) {
+  part.SumOverProcesses(Processes(hd));
+  return part.Value();
+}
+
+// Values per face of a boundary that only the faces' owners can form (they
+// read the state of the face's element): every process keeps its owned
+// faces' values and takes the others' from their owners.
+void ShareFaceValues(const HdModule& hd, const BoundaryCondition& b, Array1<double>& work) {
+  if (!hd.subdomain || !hd.subdomain->Active()) return;
+  for (int j = 1; j <= b.nfaces; ++j)
+    if (!Owned(hd.state, hd.boundary.faces[b.first_face + j - 1])) work[j] = 0.0;
+  SumOverProcesses(work.data() + 1, b.nfaces, *hd.subdomain);
+}
+
 // Along-boundary integration of the slopes work[1..n] (m/m, one per face):
 // the level at the nodes between faces grows by slope x face length, and the
 // face value is the mean of its two node values. The face values replace the
@@ -134,28 +150,27 @@ void DistributeDischargeHD(HdModule& hd, const Mesh& mesh, BoundaryCondition& b)
   if (b.type != kBcDischarge || b.nfaces == 0) return;
   HdBoundary& bc = hd.boundary;
   const HdState& st = hd.state;
-  const RunControl run = Processes(hd);
   Array1<double>& w = bc.work;
 
-  double length = 0.0, wet_length = 0.0, level_sum = 0.0;
+  ExactSum length_sum, wet_sum, level;
   for (int j = 1; j <= b.nfaces; ++j) {
     const BoundaryFaceCondition& fc = bc.faces[b.first_face + j - 1];
     if (!Owned(st, fc)) continue;
     const double len = FaceLengthMetres(mesh, fc.face);
-    length += len;
+    length_sum += len;
     if (st.wetdry[fc.element] == kWet) {
-      wet_length += len;
-      level_sum += len * st.eta[fc.element];
+      wet_sum += len;
+      level += len * st.eta[fc.element];
     }
   }
-  length = SumOverProcesses(length, run);
-  wet_length = SumOverProcesses(wet_length, run);
-  level_sum = SumOverProcesses(level_sum, run);
+  const double length = Total(length_sum, hd);
+  const double wet_length = Total(wet_sum, hd);
+  const double level_sum = Total(level, hd);
 
   // Weights per unit width: (depth under the mean wet level)^(5/3) times the
   // local conveyance 1/sqrt(K) of the bed resistance.
   const bool conveyance = hd.bed.type != kBedNone && hd.bed.K.size() >= st.nelements_owned;
-  double weight_sum = 0.0;
+  ExactSum weights;
   for (int j = 1; j <= b.nfaces; ++j) {
     const BoundaryFaceCondition& fc = bc.faces[b.first_face + j - 1];
     w[j] = 0.0;
@@ -165,9 +180,9 @@ void DistributeDischargeHD(HdModule& hd, const Mesh& mesh, BoundaryCondition& b)
     double factor = 1.0;
     if (conveyance && hd.bed.K[fc.element] > 0.0) factor = 1.0 / std::sqrt(hd.bed.K[fc.element]);
     w[j] = std::pow(depth, 5.0 / 3.0) * factor;
-    if (Owned(st, fc)) weight_sum += w[j] * FaceLengthMetres(mesh, fc.face);
+    if (Owned(st, fc)) weights += w[j] * FaceLengthMetres(mesh, fc.face);
   }
-  weight_sum = SumOverProcesses(weight_sum, run);
+  const double weight_sum = Total(weights, hd);
 
   for (int j = 1; j <= b.nfaces; ++j) {
     BoundaryFaceCondition& fc = bc.faces[b.first_face + j - 1];
@@ -210,6 +225,7 @@ void TiltLevelHD(HdModule& hd, const Mesh& mesh, BoundaryCondition& b) {
     if (pressure) force -= h * (ff.pressure_x[c] * tx + ff.pressure_y[c] * ty) / rho;
     w[j] = force / (g * h);
   }
+  ShareFaceValues(hd, b, w);
   IntegrateAlongBoundary(mesh, bc, b, b.point_tilting, w);
   AddToLevel(st, bc, b, w);
 }
@@ -218,8 +234,7 @@ void ConstrainFlatherHD(HdModule& hd, const Mesh& mesh, BoundaryCondition& b) {
   if (b.type != kBcFlather || b.type_interpolation_constrain < 1 || b.nfaces == 0) return;
   HdBoundary& bc = hd.boundary;
   const HdState& st = hd.state;
-  const RunControl run = Processes(hd);
-  double area = 0.0, discharge = 0.0;
+  ExactSum area_sum, discharge_sum;
   for (int j = 1; j <= b.nfaces; ++j) {
     const BoundaryFaceCondition& fc = bc.faces[b.first_face + j - 1];
     if (!Owned(st, fc) || st.wetdry[fc.element] != kWet) continue;
@@ -228,11 +243,11 @@ void ConstrainFlatherHD(HdModule& hd, const Mesh& mesh, BoundaryCondition& b) {
     double nx, ny, len;
     FaceMetres(mesh, fc.face, nx, ny, len);
     const double un = OldValue(fc, 2) * nx + OldValue(fc, 3) * ny;
-    area += h * len;
-    discharge -= un * h * len;
+    area_sum += h * len;
+    discharge_sum += -un * h * len;
   }
-  area = SumOverProcesses(area, run);
-  discharge = SumOverProcesses(discharge, run);
+  const double area = Total(area_sum, hd);
+  const double discharge = Total(discharge_sum, hd);
   // The prescribed discharge is one value for the whole boundary.
   const double target = OldValue(bc.faces[b.first_face], 4);
   if (b.type_interpolation_constrain == 1) {
@@ -280,6 +295,7 @@ void CorrectRadiationStressHD(HdModule& hd, const Mesh& mesh, BoundaryCondition&
     const double tx = -ny, ty = nx;
     w[j] = (ff.radiation_x[c] * tx + ff.radiation_y[c] * ty) / (g * h);
   }
+  ShareFaceValues(hd, b, w);
   IntegrateAlongBoundary(mesh, bc, b, deepest, w);
   AddToLevel(st, bc, b, w);
 }

@@ -42,7 +42,7 @@ void WriteBlowUpBlock(const HdModule& hd, const Mesh& mesh, std::string_view hea
   const double scale = hd.projection == 2 ? kRadToDeg : 1.0;
   WriteLogLine("");
   WriteLogLine(header);
-  if (hd.nprocesses > 1) WriteValueLine("domain                : %", hd.process_id);
+  if (hd.subdomain && hd.subdomain->Active()) WriteValueLine("domain                : %", hd.subdomain->owner[e] + 1);
   WriteValueLine("time                  : %", t);
   WriteValueLine("element number        : %", mesh.elements.id[e]);
   WriteValueLine("x-coordinate (center) : %", mesh.elements.xc[e] * scale);
@@ -149,18 +149,16 @@ void CHECKFLOODDRYHD(HdModule& hd, const Mesh& mesh) {
     }
     code[e] = next;
   }
-  // Summed in element order, so that the booked volume has the same bits for
-  // any number of threads.
-  if (ncut > 0) {
-    double added = 0.0;
-    for (int e = 1; e <= nown; ++e) added += cut[e];
-    fd.mass_correction += added;
-  }
+  if (ncut > 0)
+    for (int e = 1; e <= nown; ++e)
+      if (cut[e] != 0.0) fd.mass_correction.Add(cut[e]);
+  // The halo's new codes and depths: a wet halo element floods an owned one.
+  if (hd.subdomain) ExchangeHalo(*hd.subdomain, {&s.h, &s.eta}, {&s.wetdry});
 
   // 2. A wet or flooded element deeper than h_flood floods a dry neighbour
   //    whose bed lies below its water surface. Serial: it writes across faces.
   const FaceTable& faces = mesh.faces;
-  const int nf = faces.nfaces;
+  const int nf = faces.nfaces_int;  // the faces of owned elements
   for (int f = 1; f <= nf; ++f) {
     const int e1 = faces.element1[f];
     const int e2 = faces.element2[f];
@@ -199,7 +197,10 @@ void CHECKFLOODDRYHD(HdModule& hd, const Mesh& mesh) {
 }
 
 bool CheckBlowUpHD(HdModule& hd, const Mesh& mesh, double t, int* status) {
-  const HdState& s = hd.state;
+  HdState& s = hd.state;
+  // Every process takes part: the element reported is the first in the
+  // file's order over all of them, and its owner sends its values.
+  auto first_over_processes = [&](int v) { return hd.subdomain ? MinOverProcesses(v, *hd.subdomain) : v; };
   const int nown = s.nelements_owned;
   const double limit = hd.flood_dry.elevation_limit;
   const double* eta = s.eta.data();
@@ -213,6 +214,7 @@ bool CheckBlowUpHD(HdModule& hd, const Mesh& mesh, double t, int* status) {
   for (int e = 1; e <= nown; ++e) {
     if (!(eta[e] <= limit)) first = std::min(first, FileIndex(place, e));
   }
+  first = first_over_processes(first);
   std::string_view header;
   if (first != none) {
     header = "BLOW-UP - Elevation too large";
@@ -221,10 +223,12 @@ bool CheckBlowUpHD(HdModule& hd, const Mesh& mesh, double t, int* status) {
     for (int e = 1; e <= nown; ++e) {
       if (!(h[e] > 0.0)) first = std::min(first, FileIndex(place, e));
     }
+    first = first_over_processes(first);
     if (first != none) header = "BLOW-UP - Total depth too small";
   }
   if (first == none) return true;
   if (!place.empty()) first = static_cast<int>(std::find(place.begin(), place.end(), first) - place.begin()) + 1;
+  if (hd.subdomain) BroadcastElement(*hd.subdomain, first, {&s.h, &s.eta, &s.d});
 
   WriteBlowUpBlock(hd, mesh, header, first, t);
   if (status == nullptr) FatalError(header);

@@ -36,6 +36,8 @@
 #include "hydro/bound.hpp"
 #include "io/zrn.hpp"
 #include "log/log.hpp"
+#include "parallel/exact_sum.hpp"
+#include "parallel/subdomain.hpp"
 
 namespace vhd {
 
@@ -69,6 +71,10 @@ inline constexpr int kFlooded = 2;
 struct HdState {
   int nelements = 0;        // elements of the velocity mesh (owned + halo)
   int nelements_owned = 0;  // owned elements 1 .. nelements_owned
+  // Owned and halo elements 1 .. nelements_local: the elements whose values
+  // are valid after a halo exchange (parallel/subdomain.hpp); the rest of the
+  // mesh is not read in the time loop.
+  int nelements_local = 0;
   int nfaces = 0;
   int nnodes = 0;
   // Place of each element in the mesh file (mesh/reorder.hpp): files read
@@ -128,11 +134,13 @@ struct HdFloodDry {
 
   // Statistics and the blow-up limit.
   long long n_wet = 0;              // elements with code > 0 after the last check
-  double mass_correction = 0.0;     // volume added when negative depths were cut (m3)
+  // Volume added when negative depths were cut (m3), this process's owned
+  // elements; an exact sum, so that its total over the processes has the
+  // same bits for any number of threads and processes.
+  ExactSum mass_correction;
   double elevation_limit = 0.0;     // blow-up limit of the surface elevation (m)
   double elevation_margin = 100.0;  // limit = highest initial surface or bed + this margin (m)
-  // Volume added in each element by the last check (m3); summed in element
-  // order into mass_correction so that the sum does not depend on threads.
+  // Volume added in each element by the last check (m3).
   Array1<double> mass_cut;
 };
 
@@ -304,6 +312,9 @@ struct HdModule {
   TimeAxis time_axis;        // simulation start and steps (time-varying input)
   int process_id = -1;       // -1 for a single process
   int nprocesses = 1;
+  // This process's part of the mesh and the halo exchanges (set by the
+  // driver; null in a unit test of one process).
+  Subdomain* subdomain = nullptr;
   bool use_gpu = false;
   int ice_type = 0;          // ice-cover type of the forcing setup
 

@@ -198,6 +198,7 @@ void AllocateStateHD(HdModule& hd, const Mesh& mesh) {
   const int ne = el.nelements;
   s.nelements = ne;
   s.nelements_owned = el.nelements_int > 0 ? el.nelements_int : ne;
+  s.nelements_local = hd.subdomain ? hd.subdomain->nlocal : ne;
   s.nfaces = mesh.faces.nfaces;
   s.nnodes = mesh.nodes.nnodes;
   s.element_file_index = el.file_index;

@@ -13,6 +13,7 @@ namespace {
 void LimitedGradient(const HdModule& hd, HdSolver& s, const Mesh& mesh, const Array1<double>& phi,
                      Array1<double>& gx, Array1<double>& gy) {
   CALCGRADIENTELEMENT2D(s.gradient, phi, s.gradient_x, s.gradient_y);
+  if (hd.subdomain) ExchangeHalo(*hd.subdomain, {&s.gradient_x, &s.gradient_y});
   CALCLIMITEDGRADIENT2D(hd.solution.gradient_limiter, mesh, phi, hd.state.wetdry, Array1<int>(), s.gradient_x,
                         s.gradient_y, gx, gy, s.limiter_epsilon);
 }
@@ -42,11 +43,14 @@ void UpdateReconstructionHD(HdModule& hd, HdSolver& s, const Mesh& mesh) {
     CALCGRADIENTALLELEMENT2D(s.gradient, fields);
     if (limiter == kLimiterBarthJespersen)
       CALCLIMITEDGRADIENTALLBJ2D(s.limiter_geometry, st.wetdry, fields, s.limiter_epsilon);
-    return;
+  } else {
+    LimitedGradient(hd, s, mesh, st.eta, s.eta_x, s.eta_y);
+    LimitedGradient(hd, s, mesh, st.P, s.P_x, s.P_y);
+    LimitedGradient(hd, s, mesh, st.Q, s.Q_x, s.Q_y);
   }
-  LimitedGradient(hd, s, mesh, st.eta, s.eta_x, s.eta_y);
-  LimitedGradient(hd, s, mesh, st.P, s.P_x, s.P_y);
-  LimitedGradient(hd, s, mesh, st.Q, s.Q_x, s.Q_y);
+  // Gradients are formed for the owned elements; the faces to the halo read
+  // the owners' ones.
+  if (hd.subdomain) ExchangeHalo(*hd.subdomain, {&s.eta_x, &s.eta_y, &s.P_x, &s.P_y, &s.Q_x, &s.Q_y});
 }
 
 void UpdateGradientsHD(HdModule& hd, HdSolver& s, const Mesh& mesh) {
@@ -55,7 +59,7 @@ void UpdateGradientsHD(HdModule& hd, HdSolver& s, const Mesh& mesh) {
   if (!IsGeographic(mesh.projection)) return;
   // Per radian of longitude and latitude -> per metre east and north.
   const double* cos_lat = mesh.elements.cos_lat.data();
-  const int ne = st.nelements;
+  const int ne = st.nelements_owned;
   for (int e = 1; e <= ne; ++e) {
     const double east = 1.0 / (kMeshEarthRadius * cos_lat[e]), north = 1.0 / kMeshEarthRadius;
     st.ux[e] *= east;

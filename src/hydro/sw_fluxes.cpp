@@ -1252,7 +1252,15 @@ void CALCDERIVATIVESW2D(HdModule& hd, HdSolver& s, const Mesh& mesh, int stage, 
       mesh.elements.nelements_int > 0 ? mesh.elements.nelements_int : mesh.elements.nelements;
   const bool first_stage = stage == 1;
   VHD_OMP_PARALLEL { FaceTerms(hd, s, mesh, in); }
-  if (ElementSumsHD(hd, s, mesh, ne, first_stage, dt) > 0) {
+  int nlimited = ElementSumsHD(hd, s, mesh, ne, first_stage, dt);
+  if (hd.subdomain && hd.subdomain->Active()) {
+    // A face between an owned and a halo element takes the factor of its
+    // upwind side, which the halo element's owner formed.
+    ExchangeHalo(*hd.subdomain, {&s.outflow_factor});
+    for (int e = ne + 1; e <= hd.state.nelements_local && nlimited == 0; ++e)
+      if (s.outflow_factor[e] < 1.0) nlimited = 1;
+  }
+  if (nlimited > 0) {
     LimitOutflowHD(hd, s, mesh, in);
     ElementSumsHD(hd, s, mesh, ne, first_stage, 0.0);
   }

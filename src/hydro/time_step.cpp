@@ -30,7 +30,7 @@ inline double CflRate(int code, double eta, double d, double u, double v, double
 // that CheckBlowUpHD walks the elements only then; rmax is the largest rate.
 bool VelocityStressAndBlowUpTest(HdModule& hd, const HdSolver& solver, double& rmax) {
   HdState& st = hd.state;
-  const int ne = st.nelements, nown = st.nelements_owned;
+  const int ne = st.nelements_local, nown = st.nelements_owned;
   const double limit = hd.flood_dry.elevation_limit;
   const bool depth_test = hd.flood_dry.type <= 0;
   const bool gravity = solver.implicit_gravity == 0;
@@ -96,7 +96,8 @@ double SplitTimeStepHD(double dt, double remainder) {
 double CALCTIMESTEPHD(HdModule& hd, const HdSolver& solver, const Mesh& mesh, double t, double t_end) {
   const HdTimeStepControl& c = hd.time_step;
   // The rates of the state left by the last sub-step come with its end pass.
-  const double rmax = hd.cfl_rate_max_ready >= 0 ? hd.cfl_rate_max_ready : CalcCflRatesHD(hd, solver, mesh);
+  double rmax = hd.cfl_rate_max_ready >= 0 ? hd.cfl_rate_max_ready : CalcCflRatesHD(hd, solver, mesh);
+  if (hd.subdomain) rmax = MaxOverProcesses(rmax, *hd.subdomain);
   hd.cfl_rate_max_ready = -1.0;
   hd.cfl_rate_max_of_step = rmax;
   double dt;
@@ -171,7 +172,10 @@ void InitialStepHD(HdModule& hd, HdSolver& solver, const Mesh& mesh) {
   for (int f = 1; f <= st.face_flux_len.size(); ++f) st.face_flux_len[f] = 0.0;
   // Boundary values at the first time of the run (both values of each pair).
   UpdateBoundaryValuesHD(hd, mesh, hd.time_axis.TimeOfStep(hd.time_axis.first_step));
-  if (hd.eddy.horizontal.type > 0) UpdateGradientsHD(hd, solver, mesh);
+  if (hd.eddy.horizontal.type > 0) {
+    UpdateGradientsHD(hd, solver, mesh);
+    if (hd.subdomain) ExchangeHalo(*hd.subdomain, {&st.ux, &st.uy, &st.vx, &st.vy});
+  }
   CalcDerivativesOnlySW2D(hd, solver, mesh);
 }
 
@@ -215,6 +219,7 @@ void StepHD(HdModule& hd, HdSolver& solver, const Mesh& mesh, double t, double d
   if (hd.eddy.horizontal.type > 0) {
     UpdateGradientsHD(hd, solver, mesh);
     CALCEDDYVISCOSITYHD(hd, mesh);
+    if (hd.subdomain) ExchangeHalo(*hd.subdomain, {&st.ux, &st.uy, &st.vx, &st.vy, &st.nu_t});
   }
   stop(kHdTimerProperties);
 
@@ -227,14 +232,23 @@ void StepHD(HdModule& hd, HdSolver& solver, const Mesh& mesh, double t, double d
     if (second) UpdateReconstructionHD(hd, solver, mesh);
     CALCDERIVATIVESW2D(hd, solver, mesh, stage, factor * dt, stage == nstages);
     stop(kHdTimerDerivatives);
-    if (second && hd.solution.type_of_filtering >= 1) CALCVELOCITYFILTER2D(hd, solver, mesh);
+    if (second && hd.solution.type_of_filtering >= 1) {
+      // The filter averages over the neighbours' new state.
+      if (hd.subdomain) ExchangeHalo(*hd.subdomain, {&st.h, &st.eta, &st.P, &st.Q});
+      CALCVELOCITYFILTER2D(hd, solver, mesh);
+    }
+    // The next stage reads the halo's new state.
+    if (hd.subdomain && stage < nstages) ExchangeHalo(*hd.subdomain, {&st.h, &st.eta, &st.P, &st.Q});
   }
 
   start(kHdTimerFloodDry);
   if (hd.time_step.CFL_correction_HD == 1) CHECKTIMESTEPHD(hd, mesh, dt);
   CHECKFLOODDRYHD(hd, mesh);
+  if (hd.subdomain) ExchangeHalo(*hd.subdomain, {&st.h, &st.eta, &st.P, &st.Q}, {&st.wetdry});
   double rmax = 0.0;
-  if (VelocityStressAndBlowUpTest(hd, solver, rmax)) {
+  int failed = VelocityStressAndBlowUpTest(hd, solver, rmax) ? 1 : 0;
+  if (hd.subdomain) failed = MaxOverProcesses(failed, *hd.subdomain);
+  if (failed) {
     int status = 0;
     if (!CheckBlowUpHD(hd, mesh, t_new, &status)) run_status = -1;
   }

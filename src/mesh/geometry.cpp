@@ -285,10 +285,22 @@ void CalcFaces(Mesh& mesh, int& nfaces, int& nboundary_faces) {
           lfnb = lfc;
           break;
         }
-        e1.push_back(e);
-        e2.push_back(nb);
-        l1.push_back(lf);
-        l2.push_back(lfnb);
+        int a = e, la = lf, b = nb, lb = lfnb;
+        if (nb > 0 && RunOrder(el, nb) < RunOrder(el, e)) {
+          // The face takes the neighbour's side and its local node order.
+          std::swap(a, b);
+          std::swap(la, lb);
+          const RefElement& rn = ElementShape(mesh, a);
+          n = 0;
+          for (int j = 1; j <= npf; ++j) {
+            const int local = rn.MeshFaceNode(la, j);
+            if (local != 0) fn[n++] = ElementNode(el, a, local);
+          }
+        }
+        e1.push_back(a);
+        e2.push_back(b);
+        l1.push_back(la);
+        l2.push_back(lb);
         fstart.push_back(n);
         int c = 0;
         if (nb == 0) {

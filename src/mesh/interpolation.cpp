@@ -92,11 +92,11 @@ int OwnedNodes(const Mesh& mesh) { return mesh.nodes.nnodes_int > 0 ? mesh.nodes
 // such nodes, with every non-deleted element.
 template <class Value, class Fallback>
 void NodeLoop(const Mesh& mesh, Array1<double>& node_values, int mode, Value value, double all_dry,
-              const Fallback* fallback) {
+              const Fallback* fallback, bool all_nodes = false) {
   const NodeTable& nd = mesh.nodes;
   const ElementTable& el = mesh.elements;
   const bool geo = IsGeographic(mesh.projection);
-  const int n = OwnedNodes(mesh);
+  const int n = all_nodes ? nd.nnodes : OwnedNodes(mesh);
   VHD_OMP_PARALLEL_FOR
   for (int i = 1; i <= n; ++i) {
     double out = all_dry;
@@ -121,13 +121,13 @@ struct NoFallback {
 // ---- 2D ----------------------------------------------------------------------------------------
 
 void CALCNODEVALUESPL2D(const Mesh& mesh, const Array1<double>& values, Array1<double>& node_values,
-                        double delete_value, int mode) {
+                        double delete_value, int mode, bool all_nodes) {
   const double* p = values.data();
   auto value = [=](int c, double& v) {
     v = p[c];
     return v != delete_value;
   };
-  NodeLoop(mesh, node_values, mode, value, 0.0, static_cast<const NoFallback*>(nullptr));
+  NodeLoop(mesh, node_values, mode, value, 0.0, static_cast<const NoFallback*>(nullptr), all_nodes);
 }
 
 void CALCNODEVALUESWETPL2D(const Mesh& mesh, const Array1<double>& values, const Array1<int>& wet,

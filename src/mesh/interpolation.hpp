@@ -39,8 +39,10 @@ namespace vhd {
 inline constexpr int kModeScalar = 1;
 inline constexpr int kModeDirection = 2;
 
+// Node values of the owned nodes (all_nodes: of every node of the mesh,
+// from element values that are complete on the whole mesh).
 void CALCNODEVALUESPL2D(const Mesh& mesh, const Array1<double>& values, Array1<double>& node_values,
-                        double delete_value, int mode);
+                        double delete_value, int mode, bool all_nodes = false);
 void CALCNODEVALUESWETPL2D(const Mesh& mesh, const Array1<double>& values, const Array1<int>& wet,
                            Array1<double>& node_values, double delete_value, int mode);
 void CALCNODEVALUES2WETPL2D(const Mesh& mesh, const Array1<double>& values, const Array1<int>& wet,

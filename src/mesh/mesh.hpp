@@ -139,6 +139,10 @@ struct ElementTable {
   // Position of each element in the mesh file; empty while the table is in
   // file order (mesh/reorder.hpp).
   Array1<int> file_index;
+  // Position of each element in the element order of the whole mesh, before
+  // a run on several processes numbered it for one sub-domain; empty when
+  // the table is in that order.
+  Array1<int> run_order;
   // Element -> faces in the reference element's local face order (0: no face,
   // the bed or surface side of a layered column).
   Array1<int> face_start, face_list;
@@ -160,7 +164,11 @@ struct FaceTable {
   int nboundary_faces = 0;
   Array1<int> id;
   Array1<int> code;      // 0 interior; boundary code (header comment)
-  Array1<int> element1;  // the element that created the face
+  // element1: of the two elements of an interior face, the one that comes
+  // first in the run's element order (RunOrder), so that a sub-domain of a
+  // run on several processes orients every face as one process does. Faces
+  // are listed in the order the elements (in their order) first reach them.
+  Array1<int> element1;
   Array1<int> element2;  // the element across; 0 on the boundary
   Array1<int> localface1, localface2;
   int nindexes_max = 0;
@@ -274,6 +282,7 @@ inline int NodeNeighbourCount(const NodeTable& n, int i) { return n.node_start[i
 inline int NodeNeighbour(const NodeTable& n, int i, int j) { return n.node_list[n.node_start[i] + j - 1]; }
 // Place in the mesh file of node or element i (file_index of its table).
 inline int FileIndex(const Array1<int>& file_index, int i) { return file_index.empty() ? i : file_index[i]; }
+inline int RunOrder(const ElementTable& el, int e) { return el.run_order.empty() ? e : el.run_order[e]; }
 inline const RefElement& ElementShape(const Mesh& m, int e) { return m.shapes[m.elements.shape[e] - 1]; }
 
 // ---- shape table -----------------------------------------------------------------------

@@ -242,6 +242,7 @@ void ReorderMesh(Mesh& mesh, const std::vector<int>& order) {
 
     ElementTable elements = el;
     elements.file_index.assign(ne);
+    if (!el.run_order.empty()) elements.run_order.assign(ne);
     int pos = 1;
     for (int k = 1; k <= ne; ++k) {
       const int e = order[static_cast<std::size_t>(k - 1)];
@@ -249,6 +250,7 @@ void ReorderMesh(Mesh& mesh, const std::vector<int>& order) {
       elements.type[k] = el.type[e];
       elements.shape[k] = el.shape[e];
       elements.file_index[k] = FileIndex(el.file_index, e);
+      if (!el.run_order.empty()) elements.run_order[k] = el.run_order[e];
       elements.node_start[k] = pos;
       for (int j = 1; j <= ElementNodeCount(el, e); ++j) elements.node_list[pos++] = new_node[ElementNode(el, e, j)];
     }

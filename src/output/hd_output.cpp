@@ -9,7 +9,6 @@
 #include "log/log.hpp"
 #include "mesh/cartography.hpp"
 #include "hydro/time_step.hpp"
-#include "output/data_merge.hpp"
 #include "parallel/message_passing.hpp"
 
 namespace vhd {
@@ -88,11 +87,17 @@ void ElementVolumes(HdOutputs& out, const HdState& s, int nown) {
   for (int e = 1; e <= nown; ++e) out.volume[e] = s.h[e] * out.area[e];
 }
 
-double Discharge(const DischargeSpec& d, const HdState& s) {
-  double q = 0.0;
+// Discharge through a section, summed over all processes (collective): each
+// face counts on the process that owns its element1.
+double Discharge(const DischargeSpec& d, const HdState& s, const Mesh& mesh, const RunControl& run) {
+  ExactSum q;
   const int n = d.section.faces.size();
-  for (int k = 1; k <= n; ++k) q += d.section.sign[k] * s.face_flux_len[d.section.faces[k]];
-  return q;
+  for (int k = 1; k <= n; ++k) {
+    const int f = d.section.faces[k];
+    if (mesh.faces.element1[f] <= s.nelements_owned) q += d.section.sign[k] * s.face_flux_len[f];
+  }
+  q.SumOverProcesses(run);
+  return q.Value();
 }
 
 }  // namespace
@@ -129,6 +134,7 @@ const std::vector<HdItemDefinition>& HdOutputItems() {
 }
 
 void SetupOutputsHD(HdOutputs& out, const Mesh& mesh, const RunControl& run, const TimeAxis& time) {
+  out.run = run;
   OutputModuleInfo info;
   info.module = "HD";
   info.read_items = ReadItemsHD;
@@ -170,9 +176,9 @@ void OpenOutputFilesHD(HdOutputs& out, const HdModule& hd, const Mesh& mesh) {
     if (fc.element2[f] == 0 && fc.element1[f] <= nown) out.boundary_faces[++nb] = f;
 
   ElementVolumes(out, s, nown);
-  out.initial_volume = 0.0;
+  out.initial_volume.Clear();
   for (int e = 1; e <= nown; ++e) out.initial_volume += out.volume[e];
-  out.source_inflow = out.source_outflow = out.boundaries = 0.0;
+  for (ExactSum* a : {&out.source_inflow, &out.source_outflow, &out.boundaries}) a->Clear();
   out.defect_start = hd.flood_dry.mass_correction;
   for (OutputSpec& spec : out.list.outputs) {
     if (spec.type != kOutputMassBudget) continue;
@@ -186,23 +192,19 @@ void UpdateOutputsHD(HdOutputs& out, const HdModule& hd, const HdSolver& solver,
   const HdState& s = hd.state;
   const int nown = Owned(mesh);
   // Volume through the model boundary: a positive face flux leaves element1.
-  double through = 0.0;
-  for (int f : out.boundary_faces) through -= s.face_flux_len[f];
-  out.boundaries += through * dt;
+  for (int f : out.boundary_faces)
+    if (s.face_flux_len[f] != 0.0) out.boundaries += -s.face_flux_len[f] * dt;
 
   // Element sources of the last stage, which made the update of the sub-step.
   const bool sources = solver.src_h.size() >= nown;
-  double in = 0.0, outflow = 0.0;
   if (sources) {
     for (int e = 1; e <= nown; ++e) {
       const double r = solver.src_h[e] * out.area[e];
       out.rate[e] = r;
-      if (r > 0) in += r;
-      else outflow += r;
+      if (r > 0) out.source_inflow += r * dt;
+      else if (r < 0) out.source_outflow += r * dt;
     }
   }
-  out.source_inflow += in * dt;
-  out.source_outflow += outflow * dt;
 
   const bool cuts = hd.flood_dry.type > 0 && hd.flood_dry.mass_cut.size() >= nown;
   for (OutputSpec& spec : out.list.outputs) {
@@ -215,7 +217,7 @@ void UpdateOutputsHD(HdOutputs& out, const HdModule& hd, const HdSolver& solver,
         if (cuts) AccumulateBudgetDefect(spec.budget, k, hd.flood_dry.mass_cut);
       }
     } else if (spec.type == kOutputDischarge) {
-      const double q = Discharge(spec.discharge, s);
+      const double q = Discharge(spec.discharge, s, mesh, out.run);
       spec.discharge.accumulated += q * dt;
       if (q > 0) spec.discharge.positive += q * dt;
       else spec.discharge.negative += q * dt;
@@ -281,21 +283,23 @@ void WriteOutputHD2D(HdOutputs& out, const HdModule& hd, const Mesh& mesh, int n
       case kOutputField2D:
         for (const OutputItem& item : spec.items) {
           HdItemValues(out, hd, mesh, item.code, spec.flood_and_dry, spec.delete_value, out.values);
+          // Process 0 writes the values of every process.
+          if (hd.subdomain) GatherOwned(*hd.subdomain, out.values);
           WriteFieldItem(spec, mesh, item, out.values, out.nodes, t);
         }
         break;
       case kOutputMassBudget: {
         if (!volumes) ElementVolumes(out, hd.state, Owned(mesh));
         volumes = true;
-        const BudgetAmounts now = BudgetAmountsOf(spec.budget, out.volume, hd.state.wetdry);
+        const BudgetAmounts now = BudgetAmountsOf(spec.budget, out.volume, hd.state.wetdry, out.run);
         for (const OutputItem& item : spec.items)
-          WriteValueItem(spec, BudgetItemValue(spec.budget, item.code / 100, item.code % 100, now), t);
+          WriteValueItem(spec, BudgetItemValue(spec.budget, item.code / 100, item.code % 100, now, out.run), t);
         break;
       }
       case kOutputDischarge:
         for (const OutputItem& item : spec.items) {
           const DischargeSpec& d = spec.discharge;
-          const double v = item.code == kDischarge ? Discharge(d, hd.state)
+          const double v = item.code == kDischarge ? Discharge(d, hd.state, mesh, out.run)
                            : item.code == kDischargeAccumulated ? d.accumulated
                            : item.code == kDischargePositive    ? d.positive
                                                                 : d.negative;
@@ -310,25 +314,40 @@ void WriteOutputHD2D(HdOutputs& out, const HdModule& hd, const Mesh& mesh, int n
 
 void CloseOutputFilesHD(HdOutputs& out) { CloseOutputFiles(out.list); }
 
-void OutputStatisticsHD(HdOutputs& out, const RunControl& run) { MergeOutputFiles(out.list, run); }
+void OutputStatisticsHD(HdOutputs& out, const RunControl& run) {
+  if (run.nprocesses <= 1) return;
+  WriteBanner("Output Statistics " + out.list.module);
+  for (const OutputSpec& spec : out.list.outputs) {
+    WriteLogLine("  Output " + std::to_string(spec.number) + " : " + ZrnLogName(spec.path) +
+                 (spec.write ? "" : " (written by process 0)"));
+    WriteValueLine("    Records written : %", spec.records);
+  }
+  WriteBanner("");
+}
 
 VolumeBalance VolumeBalanceHD(const HdOutputs& out, const HdModule& hd, const Mesh& mesh, const RunControl& run) {
   const HdState& s = hd.state;
   const int nown = Owned(mesh);
-  double wet = 0.0, dry = 0.0;
+  ExactSum wet, dry;
   for (int e = 1; e <= nown; ++e) {
     const double v = s.h[e] * out.area[e];
     if (s.wetdry[e] > 0) wet += v;
     else dry += v;
   }
+  ExactSum defect = hd.flood_dry.mass_correction;
+  defect.Subtract(out.defect_start);
+  auto total = [&](ExactSum part) {
+    part.SumOverProcesses(run);
+    return part.Value();
+  };
   VolumeBalance b;
-  b.initial = SumOverProcesses(out.initial_volume, run);
-  b.final_wet = SumOverProcesses(wet, run);
-  b.final_dry = SumOverProcesses(dry, run);
-  b.source_inflow = SumOverProcesses(out.source_inflow, run);
-  b.source_outflow = SumOverProcesses(out.source_outflow, run);
-  b.boundaries = SumOverProcesses(out.boundaries, run);
-  b.defect = SumOverProcesses(hd.flood_dry.mass_correction - out.defect_start, run);
+  b.initial = total(out.initial_volume);
+  b.final_wet = total(wet);
+  b.final_dry = total(dry);
+  b.source_inflow = total(out.source_inflow);
+  b.source_outflow = total(out.source_outflow);
+  b.boundaries = total(out.boundaries);
+  b.defect = total(defect);
   b.show_sources = hd.mode > 1;
   b.show_defect = hd.flood_dry.type > 0;
   return b;

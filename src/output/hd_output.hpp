@@ -81,11 +81,15 @@ struct HdOutputs {
   bool need_north = false;
   Array1<double> true_north;
 
-  // Accounting of the water volume (this process, m3).
-  double initial_volume = 0.0;
-  double source_inflow = 0.0, source_outflow = 0.0;
-  double boundaries = 0.0;
-  double defect_start = 0.0;   // the module's volume correction at the start
+  RunControl run;  // the processes of the run
+
+  // Accounting of the water volume (this process's owned elements and
+  // boundary faces, m3), as exact sums so that the totals over the processes
+  // do not depend on the split of the mesh.
+  ExactSum initial_volume;
+  ExactSum source_inflow, source_outflow;
+  ExactSum boundaries;
+  ExactSum defect_start;  // the module's volume correction at the start
   Array1<int> boundary_faces;  // owned faces on the model boundary
 
   // Work arrays, sized when the files are opened.

@@ -95,63 +95,69 @@ void SpecMassBudget(MassBudgetSpec& budget, const std::vector<std::string>& comp
   if (budget.write_section == 1) WriteBudgetSection(budget, mesh);
 }
 
-BudgetAmounts BudgetAmountsOf(const MassBudgetSpec& budget, const Array1<double>& amount, const Array1<int>& code) {
-  BudgetAmounts a;
+BudgetAmounts BudgetAmountsOf(const MassBudgetSpec& budget, const Array1<double>& amount, const Array1<int>& code,
+                              const RunControl& run) {
+  ExactSum total, wet, real_wet, dry;
   for (int e : budget.elements) {
     const double m = amount[e];
-    a.total += m;
-    if (code[e] > 0) a.wet += m;
-    if (code[e] == 1) a.real_wet += m;
-    if (code[e] == 0) a.dry += m;
+    total += m;
+    if (code[e] > 0) wet += m;
+    if (code[e] == 1) real_wet += m;
+    if (code[e] == 0) dry += m;
   }
-  return a;
+  for (ExactSum* s : {&total, &wet, &real_wet, &dry}) s->SumOverProcesses(run);
+  return BudgetAmounts{total.Value(), wet.Value(), real_wet.Value(), dry.Value()};
 }
 
 void StartBudget(MassBudgetSpec& budget, int c, const Array1<double>& amount) {
-  double total = 0.0;
-  for (int e : budget.elements) total += amount[e];
   BudgetComponent& bc = budget.components[static_cast<std::size_t>(c)];
-  bc.initial = total;
-  bc.transport = bc.source = bc.process = bc.defect = 0.0;
+  for (ExactSum* s : {&bc.initial, &bc.transport, &bc.source, &bc.process, &bc.defect}) s->Clear();
+  for (int e : budget.elements) bc.initial += amount[e];
 }
 
 void AccumulateBudgetTransport(MassBudgetSpec& budget, int c, const Array1<double>& face_flux, double dt) {
-  double in = 0.0;
+  ExactSum& in = budget.components[static_cast<std::size_t>(c)].transport;
   const int n = budget.border_faces.size();
-  for (int k = 1; k <= n; ++k) in -= budget.border_sign[k] * face_flux[budget.border_faces[k]];
-  budget.components[static_cast<std::size_t>(c)].transport += in * dt;
+  for (int k = 1; k <= n; ++k) in += -budget.border_sign[k] * face_flux[budget.border_faces[k]] * dt;
 }
 
 void AccumulateBudgetSource(MassBudgetSpec& budget, int c, const Array1<double>& rate, double dt) {
-  double s = 0.0;
-  for (int e : budget.elements) s += rate[e];
-  budget.components[static_cast<std::size_t>(c)].source += s * dt;
+  ExactSum& s = budget.components[static_cast<std::size_t>(c)].source;
+  for (int e : budget.elements) s += rate[e] * dt;
 }
 
 void AccumulateBudgetProcess(MassBudgetSpec& budget, int c, const Array1<double>& rate, double dt) {
-  double s = 0.0;
-  for (int e : budget.elements) s += rate[e];
-  budget.components[static_cast<std::size_t>(c)].process += s * dt;
+  ExactSum& s = budget.components[static_cast<std::size_t>(c)].process;
+  for (int e : budget.elements) s += rate[e] * dt;
 }
 
 void AccumulateBudgetDefect(MassBudgetSpec& budget, int c, const Array1<double>& added) {
-  double s = 0.0;
-  for (int e : budget.elements) s += added[e];
-  budget.components[static_cast<std::size_t>(c)].defect += s;
+  ExactSum& s = budget.components[static_cast<std::size_t>(c)].defect;
+  for (int e : budget.elements)
+    if (added[e] != 0.0) s += added[e];
 }
 
-double BudgetItemValue(const MassBudgetSpec& budget, int c, int k, const BudgetAmounts& now) {
+double BudgetItemValue(const MassBudgetSpec& budget, int c, int k, const BudgetAmounts& now, const RunControl& run) {
   const BudgetComponent& bc = budget.components[static_cast<std::size_t>(c)];
+  auto total = [&](const ExactSum& part) {
+    ExactSum s = part;
+    s.SumOverProcesses(run);
+    return s.Value();
+  };
   switch (k) {
     case kBudgetTotal: return now.total;
     case kBudgetWet: return now.wet;
     case kBudgetRealWet: return now.real_wet;
     case kBudgetDry: return now.dry;
-    case kBudgetTransport: return bc.transport;
-    case kBudgetSource: return bc.source;
-    case kBudgetProcess: return bc.process;
-    case kBudgetDefect: return bc.defect;
-    case kBudgetError: return now.total - bc.initial - bc.transport - bc.source - bc.process - bc.defect;
+    case kBudgetTransport: return total(bc.transport);
+    case kBudgetSource: return total(bc.source);
+    case kBudgetProcess: return total(bc.process);
+    case kBudgetDefect: return total(bc.defect);
+    case kBudgetError: {
+      ExactSum booked;  // every booked term, in one exact sum
+      for (const ExactSum* s : {&bc.initial, &bc.transport, &bc.source, &bc.process, &bc.defect}) booked.Add(*s);
+      return now.total - total(booked);
+    }
     default: FatalError("SpecMassBudget: Item not supported");
   }
 }

@@ -33,6 +33,8 @@
 #include <vector>
 
 #include "core/array1.hpp"
+#include "core/run.hpp"
+#include "parallel/exact_sum.hpp"
 #include "mesh/mesh.hpp"
 
 namespace vhd {
@@ -56,8 +58,11 @@ const char* BudgetItemLabel(int k);
 struct BudgetComponent {
   std::string name;   // " Flow" for the water volume, else " " + component name
   int index = 0;      // 0 the flow, k >= 1 the module's component k
-  double initial = 0.0;   // total amount at the start
-  double transport = 0.0, source = 0.0, process = 0.0, defect = 0.0;
+  // This process's part (its owned elements and the border faces of its
+  // owned elements), as exact sums: every term is added on its own, so that
+  // the total over the processes does not depend on how the mesh is split.
+  ExactSum initial;  // total amount at the start
+  ExactSum transport, source, process, defect;
 };
 
 struct MassBudgetSpec {
@@ -87,7 +92,9 @@ void SpecMassBudget(MassBudgetSpec& budget, const std::vector<std::string>& comp
 struct BudgetAmounts {
   double total = 0.0, wet = 0.0, real_wet = 0.0, dry = 0.0;
 };
-BudgetAmounts BudgetAmountsOf(const MassBudgetSpec& budget, const Array1<double>& amount, const Array1<int>& code);
+// Summed over all processes (collective).
+BudgetAmounts BudgetAmountsOf(const MassBudgetSpec& budget, const Array1<double>& amount, const Array1<int>& code,
+                              const RunControl& run);
 
 // Sets the initial amount of component c (position in budget.components).
 void StartBudget(MassBudgetSpec& budget, int c, const Array1<double>& amount);
@@ -102,7 +109,8 @@ void AccumulateBudgetDefect(MassBudgetSpec& budget, int c, const Array1<double>&
 
 // Value of item k (1 .. 9) of component c from the current amounts; an
 // unknown item is the fatal error "SpecMassBudget: Item not supported".
-double BudgetItemValue(const MassBudgetSpec& budget, int c, int k, const BudgetAmounts& now);
+// The accumulated terms are summed over all processes (collective).
+double BudgetItemValue(const MassBudgetSpec& budget, int c, int k, const BudgetAmounts& now, const RunControl& run);
 
 // Writes the polygon to file_name_section (x y per line, closed).
 void WriteBudgetSection(const MassBudgetSpec& budget, const Mesh& mesh);

@@ -44,11 +44,9 @@ void EnsureTree(OutputList& list, const Mesh& mesh) {
   list.have_tree = true;
 }
 
-// Owned element that holds (x, y), 0 when none does on this process.
-int FindOwnedElement(const OutputList& list, const Mesh& mesh, double x, double y) {
-  const int e = FindElementID2DSearchTree(x, y, mesh, list.tree);
-  const int nown = mesh.elements.nelements_int > 0 ? mesh.elements.nelements_int : mesh.elements.nelements;
-  return e <= nown ? e : 0;
+// Element that holds (x, y), 0 when none does.
+int FindMeshElement(const OutputList& list, const Mesh& mesh, double x, double y) {
+  return FindElementID2DSearchTree(x, y, mesh, list.tree);
 }
 
 int CountInside(const std::vector<OutputPoint>& points) {
@@ -116,25 +114,12 @@ void SetupDischargeDomain(OutputSpec& spec, const Mesh& mesh, const OutputList& 
   std::vector<double> x, y;
   ReadLinePolyline(mesh, false, npoints, x, y);
   SktCloseSection();
-  MeshSection all;
-  if (list.nprocesses > 1) CalcSection2D(mesh, x, y, all);
-  else SetupSection2D(mesh, x, y, all);
-  // Only the faces this process owns carry its share of the discharge.
-  const int nown = mesh.faces.nfaces_int > 0 ? mesh.faces.nfaces_int : mesh.faces.nfaces;
-  int n = 0;
-  for (int k = 1; k <= all.faces.size(); ++k) n += all.faces[k] <= nown ? 1 : 0;
+  (void)list;
   MeshSection& s = spec.discharge.section;
+  SetupSection2D(mesh, x, y, s);
   s.x = x;
   s.y = y;
-  s.faces.assign(n);
-  s.sign.assign(n);
-  n = 0;
-  for (int k = 1; k <= all.faces.size(); ++k) {
-    if (all.faces[k] > nown) continue;
-    ++n;
-    s.faces[n] = all.faces[k];
-    s.sign[n] = all.sign[k];
-  }
+  const int n = s.faces.size();
   WriteLogLine("");
   WriteLogLine("  Discharge Output Information");
   WriteLogLine("    From                : " + Coordinates(mesh, x.front(), y.front()));
@@ -271,7 +256,10 @@ void ReadOutput(OutputSpec& spec, OutputList& list, const OutputModuleInfo& info
       else if (spec.domain == OutputDomain::kArea) SetupAreaDomain(spec, mesh, list);
       else FatalError("SpecOutputDomain: Output format not supported - no 3D outputs in a 2D run" + Where(spec));
   }
-  spec.path = ProcessFileName(spec.file_name, run.process_id, run.nprocesses);
+  // Process 0 writes the whole file: the other processes send it their
+  // values (and write nothing), so there are no per-process files to merge.
+  spec.path = spec.file_name;
+  spec.write = run.process_id <= 0;
   spec.merge = list.merge_data;
 }
 
@@ -360,14 +348,6 @@ void ReadPointInput(const std::string& routine, const Mesh& mesh, std::vector<do
   }
 }
 
-std::string ProcessFileName(const std::string& name, int process_id, int nprocesses) {
-  if (nprocesses <= 1 || process_id < 0) return name;
-  std::filesystem::path p(name);
-  const std::string ext = p.extension().string();
-  p.replace_extension();
-  return p.string() + "_p" + std::to_string(process_id) + ext;
-}
-
 bool OutputStepDue(const OutputSpec& spec, int n) {
   if (n == -1) return true;
   return n >= spec.first_time_step && n <= spec.last_time_step &&
@@ -402,15 +382,13 @@ void SetupPointDomain(OutputSpec& spec, const Mesh& mesh, OutputList& list) {
   EnsureTree(list, mesh);
   spec.points.clear();
   for (std::size_t k = 0; k < x.size(); ++k)
-    spec.points.push_back(OutputPoint{names[k], x[k], y[k], FindOwnedElement(list, mesh, x[k], y[k])});
+    spec.points.push_back(OutputPoint{names[k], x[k], y[k], FindMeshElement(list, mesh, x[k], y[k])});
   const int inside = CountInside(spec.points);
   WriteLogLine("");
   WriteLogLine("  Point Output Information");
   for (const auto& p : spec.points)
     WriteLogLine("    " + p.name + " : " + Coordinates(mesh, p.x, p.y) + "  element " +
                  (p.element > 0 ? std::to_string(mesh.elements.id[p.element]) : std::string("outside")));
-  // With several processes a point lies in one partition only.
-  if (list.nprocesses > 1) return;
   if (inside == 0) Warning("SetupPointDomain: No points inside domain");
   else if (inside < static_cast<int>(spec.points.size()))
     Warning(SubstituteValue("SetupPointDomain: Only % points inside domain", inside));
@@ -438,7 +416,7 @@ void SetupLineDomain(OutputSpec& spec, const Mesh& mesh, OutputList& list) {
     const double w = len > 0 ? std::clamp((s - along[seg - 1]) / len, 0.0, 1.0) : 0.0;
     const double px = x[seg - 1] + w * (x[seg] - x[seg - 1]);
     const double py = y[seg - 1] + w * (y[seg] - y[seg - 1]);
-    spec.points.push_back(OutputPoint{"", px, py, FindOwnedElement(list, mesh, px, py)});
+    spec.points.push_back(OutputPoint{"", px, py, FindMeshElement(list, mesh, px, py)});
   }
   spec.x0 = 0.0;
   spec.dx = FromMeshCoordinate(mesh, spec.line_length) / (npoints - 1);
@@ -450,7 +428,6 @@ void SetupLineDomain(OutputSpec& spec, const Mesh& mesh, OutputList& list) {
   WriteValueLine("  Number of points    : %", npoints);
   WriteValueLine("  Points inside       : %", inside);
   WriteValueLine("  Point spacing       : %", spec.dx);
-  if (list.nprocesses > 1) return;
   if (inside == 0) Warning("SetupLineDomain: No points inside domain");
   else if (inside < npoints) Warning(SubstituteValue("SetupLineDomain: % points outside domain", npoints - inside));
 }
@@ -461,7 +438,7 @@ void SetupAreaDomain(OutputSpec& spec, const Mesh& mesh, OutputList& list) {
   double xmin, xmax, ymin, ymax;
   MeshBox(mesh, xmin, xmax, ymin, ymax);
   const ElementTable& el = mesh.elements;
-  const int nown = el.nelements_int > 0 ? el.nelements_int : el.nelements;
+  const int nown = el.nelements;  // every element: process 0 writes the whole mesh
 
   if (spec.file_kind == 2) {
     // A regular grid sampled from the mesh.
@@ -489,12 +466,12 @@ void SetupAreaDomain(OutputSpec& spec, const Mesh& mesh, OutputList& list) {
         const double a = i * spec.dx, b = j * spec.dy;
         const double px = ToMeshCoordinate(mesh, spec.x0 + a * std::cos(o) + b * std::sin(o));
         const double py = ToMeshCoordinate(mesh, spec.y0 - a * std::sin(o) + b * std::cos(o));
-        const int e = FindOwnedElement(list, mesh, px, py);
+        const int e = FindMeshElement(list, mesh, px, py);
         inside += e > 0 ? 1 : 0;
         spec.points.push_back(OutputPoint{"", px, py, e});
       }
     }
-    if (inside == 0 && list.nprocesses <= 1) Warning("SetupAreaDomain: No elements in selected area");
+    if (inside == 0) Warning("SetupAreaDomain: No elements in selected area");
     return;
   }
 

@@ -29,9 +29,12 @@
 // Coordinates in the setup file are those of the mesh's files: degrees on a
 // "LONG/LAT" mesh (held in radians inside), projected metres otherwise.
 //
-// With several processes each process writes its own file, "_p" + its id
-// before the extension, over its owned elements; merge_data (data_merge.hpp)
-// joins them into the plain name after the run.
+// With several processes every process sets up every output on the whole
+// mesh, and process 0 alone writes the files: the others send it their
+// owned elements' values (GatherOwned) and their parts of every sum, so a
+// file holds the same values as after a run on one process. There are no
+// per-process files; merge_data and ordering are read and have nothing left
+// to do.
 //
 // Everything here runs on the main thread; writing allocates nothing.
 
@@ -99,6 +102,7 @@ struct OutputSpec {
   double land_value = 10.0;
   int flood_and_dry = 1;
   int ordering = 1;
+  bool write = true;  // this process writes the file (process 0 or a single process)
   int precision = 2;  // 1 single, 2 double
   int first_time_step = 0;
   int last_time_step = 0;
@@ -172,10 +176,6 @@ OutputDomain SpecOutputDomain(const OutputSpec& spec, int dim);
 void SetupPointDomain(OutputSpec& spec, const Mesh& mesh, OutputList& list);
 void SetupLineDomain(OutputSpec& spec, const Mesh& mesh, OutputList& list);
 void SetupAreaDomain(OutputSpec& spec, const Mesh& mesh, OutputList& list);
-
-// Name of the file a process writes: "_p" + id before the extension when
-// several processes run.
-std::string ProcessFileName(const std::string& name, int process_id, int nprocesses);
 
 // True when step n is one of the output's steps (n = -1: always).
 bool OutputStepDue(const OutputSpec& spec, int n);

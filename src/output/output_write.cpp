@@ -70,6 +70,11 @@ void DefineItem(ZrnFile& f, int k, const OutputItem& item, const std::string& na
 
 void OpenOne(OutputSpec& spec, const Mesh& mesh, const OutputList& list) {
   if (spec.format >= 5) FatalError("OpenOutputFiles: Output format not supported");
+  if (!spec.write) {  // another process writes it; this one only takes part
+    spec.open = spec.file_kind >= 0;
+    spec.records = 0;
+    return;
+  }
   if (spec.file_kind < 0) {
     Warning("OpenOutputFiles: " + spec.file_name + " has no data-file extension (.zrn0, .zrn1, .zrn2, .zrnu): " +
             "output " + std::to_string(spec.number) + " writes no file");
@@ -135,6 +140,7 @@ bool BeginOutputRecord(const OutputSpec& spec, int n, double t) {
 
 void WriteFieldItem(OutputSpec& spec, const Mesh& mesh, const OutputItem& item, const Array1<double>& values,
                     Array1<double>& node_values, double t) {
+  if (!spec.write) return;
   const double del = spec.delete_value;
   double* buf = spec.buffer.data();
   if (spec.domain == OutputDomain::kArea && spec.file_kind == 4) {
@@ -147,7 +153,8 @@ void WriteFieldItem(OutputSpec& spec, const Mesh& mesh, const OutputItem& item, 
     return;
   }
   const bool interpolate = spec.interpolation_type == 1 && !item.discrete;
-  if (interpolate) CALCNODEVALUESPL2D(mesh, values, node_values, del, item.mode);
+  // The values are complete on the whole mesh (process 0 gathered them).
+  if (interpolate) CALCNODEVALUESPL2D(mesh, values, node_values, del, item.mode, true);
   const double outside = spec.file_kind == 2 ? spec.land_value : del;
   const std::size_t np = spec.points.size();
   for (std::size_t k = 0; k < np; ++k) {
@@ -166,6 +173,7 @@ void WriteFieldItem(OutputSpec& spec, const Mesh& mesh, const OutputItem& item, 
 }
 
 void WriteValueItem(OutputSpec& spec, double value, double t) {
+  if (!spec.write) return;
   spec.buffer[0] = value;
   zrnWriteItemTimeStep(spec.file, t, spec.buffer.data(), 1);
 }
@@ -178,7 +186,7 @@ void EndOutputRecord(OutputSpec& spec, double t) {
 void CloseOutputFiles(OutputList& list) {
   for (OutputSpec& spec : list.outputs) {
     if (!spec.open) continue;
-    zrnFileClose(spec.file);
+    if (spec.write) zrnFileClose(spec.file);
     spec.open = false;
   }
 }

@@ -20,13 +20,7 @@ namespace {
 int g_nprocesses = 1;
 TimingSet g_mpi_timings;
 
-void Check(int rc) {
-  if (rc == MPI_SUCCESS) return;
-  char text[MPI_MAX_ERROR_STRING];
-  int length = 0;
-  MPI_Error_string(rc, text, &length);
-  FatalError(std::string(text, static_cast<std::size_t>(length)));
-}
+void Check(int rc) { CheckMpiCall(rc); }
 
 bool MpiActive() {
   int initialized = 0, finalized = 0;
@@ -46,6 +40,14 @@ void AbortOrFinalize(int status) {
 }
 
 }  // namespace
+
+void CheckMpiCall(int rc) {
+  if (rc == MPI_SUCCESS) return;
+  char text[MPI_MAX_ERROR_STRING];
+  int length = 0;
+  MPI_Error_string(rc, text, &length);
+  FatalError(std::string(text, static_cast<std::size_t>(length)));
+}
 
 void StartMessagePassing(int& argc, char**& argv, RunControl& run) {
   run.process_id = -1;

@@ -14,6 +14,10 @@
 
 namespace vhd {
 
+// Ends the run with the library's text of a failed message-passing call
+// (rc: its return code).
+void CheckMpiCall(int rc);
+
 // MPI_Init; fills process_id and nprocesses of run.
 void StartMessagePassing(int& argc, char**& argv, RunControl& run);
 // Barrier and MPI_Finalize (nothing with a single process).

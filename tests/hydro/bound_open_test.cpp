@@ -210,7 +210,7 @@ TEST(BoundOpen, DischargeBoundaryDeliversThePrescribedVolume) {
                                      (level > 0 ? ", wet bed, " : ", dry bed, ") + LayoutName(layout) + ", order " +
                                      std::to_string(order);
             ASSERT_GE(b.c.run_status, 0) << what;
-            const double entered = test::Volume(b.c) - v0 - b.c.hd.flood_dry.mass_correction;
+            const double entered = test::Volume(b.c) - v0 - b.c.hd.flood_dry.mass_correction.Value();
             EXPECT_NEAR(entered / (Q * T), 1.0, 0.01) << what;
           }
         }

@@ -114,13 +114,13 @@ TEST(CheckFloodDry, NegativeDepthIsCutAndBooked) {
   r.hd.state.d[1] = -0.5;
   r.Set(1, -0.001, kWet);
   r.Set(2, 1.0, kWet);
-  r.hd.flood_dry.mass_correction = 0.25;
+  r.hd.flood_dry.mass_correction.Add(0.25);
   CHECKFLOODDRYHD(r.hd, r.mesh);
   const HdState& s = r.hd.state;
   EXPECT_EQ(s.wetdry[1], kDry);
   EXPECT_EQ(s.h[1], 0.0);
   EXPECT_DOUBLE_EQ(s.eta[1], -s.d[1]);
-  EXPECT_DOUBLE_EQ(r.hd.flood_dry.mass_correction, 0.25 + 0.001 * 100.0);
+  EXPECT_DOUBLE_EQ(r.hd.flood_dry.mass_correction.Value(), 0.25 + 0.001 * 100.0);
   EXPECT_DOUBLE_EQ(r.hd.flood_dry.mass_cut[1], 0.1);
 }
 
@@ -181,8 +181,8 @@ TEST(CheckFloodDry, SameBitsForOneAndTwoThreads) {
   };
   const HdModule a = run(1);
   const HdModule b = run(2);
-  EXPECT_GT(a.flood_dry.mass_correction, 0.0);
-  EXPECT_EQ(a.flood_dry.mass_correction, b.flood_dry.mass_correction);
+  EXPECT_GT(a.flood_dry.mass_correction.Value(), 0.0);
+  EXPECT_EQ(a.flood_dry.mass_correction.Value(), b.flood_dry.mass_correction.Value());
   EXPECT_EQ(a.flood_dry.n_wet, b.flood_dry.n_wet);
   for (int e = 1; e <= a.state.nelements; ++e) {
     ASSERT_EQ(a.state.wetdry[e], b.state.wetdry[e]);
@@ -216,7 +216,7 @@ TEST(InitialState, FlatSurfaceOverEmergedBedStartsDryWithNonNegativeDepth) {
   EXPECT_GT(dry, 0);
   // Flooding a dry element across a face never happens from still water at
   // datum: every dry bed is above the surface.
-  EXPECT_EQ(f.hd.flood_dry.mass_correction, 0.0);
+  EXPECT_EQ(f.hd.flood_dry.mass_correction.Value(), 0.0);
 }
 
 TEST(InitialState, ConstantValuesGiveFluxesAndLowSurfacesSitOnTheBed) {

@@ -109,7 +109,7 @@ long long RunBasin(const BasinRun& run, std::vector<double>& h, double& volume0,
   volume0 = Volume(c);
   RunTo(c, 5.0);
   volume1 = Volume(c);
-  correction = c.hd.flood_dry.mass_correction;
+  correction = c.hd.flood_dry.mass_correction.Value();
   h.assign(c.hd.state.h.begin(), c.hd.state.h.end());
   OmpSetThreads(1);
   return c.hd.n_steps;

@@ -116,7 +116,7 @@ Result RunBowl(int n, int solver, int order) {
   for (int e = 1; e <= st.nelements; ++e) err += std::abs(st.h[e] - exact.Depth(el.xc[e], el.yc[e], T)) * el.area[e];
   r.l1 = err / (kPi * kA * kA);
   r.speed_loss = 1 - std::hypot(st.u[centre], st.v[centre]) / (kEta * exact.omega);
-  r.volume_error = std::abs(Volume(c) - volume0 - c.hd.flood_dry.mass_correction) / volume0;
+  r.volume_error = std::abs(Volume(c) - volume0 - c.hd.flood_dry.mass_correction.Value()) / volume0;
   r.steps = c.hd.n_steps;
   r.status = c.run_status;
   return r;

@@ -6,7 +6,6 @@
 #include <filesystem>
 
 #include "io/units.hpp"
-#include "output/data_merge.hpp"
 #include "output_support.hpp"
 
 namespace vhd::test {
@@ -105,53 +104,6 @@ TEST(VolumeBalance, ClosedBasinConservesTheVolumeAndThePolygonBudgetCloses) {
   EXPECT_LT(std::fabs(end[8]), 1e-9 * start[0]);
   EXPECT_NEAR(end[1] + end[3], end[0], 1e-9 * start[0]);
   EXPECT_TRUE(std::filesystem::exists(c.File("budget.xyz")));
-}
-
-// Two per-process budget files merge into their sum; files that disagree are refused.
-void WriteSeries(const std::string& path, const std::vector<double>& values, double dt) {
-  ZrnFile f;
-  zrnHeaderCreate(f, path, kZrnFileData, "part");
-  zrnSetNeqCalendarAxis(f, ZrnDateTime{2004, 1, 1, 0, 0, 0});
-  zrnSetItemInfo(f, 1, "Total area, Flow", kUvqIVolume, kUvqUm3, kZrnDouble);
-  zrnSetItemAxisEqD0(f, 1);
-  zrnFileCreate(f);
-  for (std::size_t s = 0; s < values.size(); ++s) zrnWriteItemTimeStep(f, s * dt, &values[s], 1);
-  zrnFileClose(f);
-}
-
-TEST(DataMergeTest, SumsPartsAndRefusesMismatches) {
-  TempDir dir;
-  WriteSeries(dir.file("b_p0.zrn0"), {1.0, 2.0, 3.0}, 30.0);
-  WriteSeries(dir.file("b_p1.zrn0"), {10.0, 20.0, 30.0}, 30.0);
-  DataMerge({dir.file("b_p0.zrn0"), dir.file("b_p1.zrn0")}, dir.file("b.zrn0"), MergeRule::kMergeSum, 1e-35, 1);
-  ZrnFile f;
-  zrnFileRead(f, dir.file("b.zrn0"));
-  ASSERT_EQ(f.time.nsteps, 3);
-  double v = 0;
-  ZrnReadItemAtStep(f, 2, 1, &v, 1);
-  EXPECT_EQ(v, 33.0);
-  zrnFileClose(f);
-
-  OpenLogFile(dir.file("merge.log"));
-  WriteSeries(dir.file("c_p1.zrn0"), {10.0, 20.0}, 30.0);
-  WriteSeries(dir.file("d_p1.zrn0"), {10.0, 20.0, 30.0}, 60.0);
-  EXPECT_EXIT(
-      {
-        OmpSetThreads(1);
-        DataMerge({dir.file("b_p0.zrn0"), dir.file("c_p1.zrn0")}, dir.file("c.zrn0"), MergeRule::kMergeSum, 1e-35, 1);
-      },
-      ::testing::ExitedWithCode(1), "");
-  EXPECT_EXIT(
-      {
-        OmpSetThreads(1);
-        DataMerge({dir.file("b_p0.zrn0"), dir.file("d_p1.zrn0")}, dir.file("d.zrn0"), MergeRule::kMergeSum, 1e-35, 1);
-      },
-      ::testing::ExitedWithCode(1), "");
-  CloseLogFile();
-  const std::string log = ReadTextFile(dir.file("merge.log"));
-  EXPECT_NE(log.find("DataMerge: Number of timesteps mismatch, file:"), std::string::npos) << log;
-  EXPECT_NE(log.find("DataMerge: Timestep mismatch, file:"), std::string::npos) << log;
-  EXPECT_FALSE(std::filesystem::exists(dir.file("c.zrn0")));
 }
 
 }  // namespace

@@ -75,11 +75,6 @@ TEST(OutputSetup, ExcludedOutputReadsNothingAndWritesNoFile) {
   EXPECT_EQ(log.find("skipped.zrnu"), std::string::npos);
 }
 
-TEST(OutputSetup, ProcessFileNames) {
-  EXPECT_EQ(ProcessFileName("/r/area.zrnu", 3, 4), "/r/area_p3.zrnu");
-  EXPECT_EQ(ProcessFileName("/r/area.zrnu", -1, 1), "/r/area.zrnu");
-}
-
 void SetupAndExpectFatal(const std::string& body, const std::string& text) {
   OutputCase c;
   c.MakeMesh(2, 2, 10.0, 10.0, [](double, double) { return -1.0; });
