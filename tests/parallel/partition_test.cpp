@@ -13,7 +13,9 @@
 
 #include "io/setup.hpp"
 #include "log/log.hpp"
+#include "mesh/domain.hpp"
 #include "mesh/generate.hpp"
+#include "mesh/read_mesh.hpp"
 #include "mesh/reorder.hpp"
 #include "test_support.hpp"
 
@@ -373,6 +375,39 @@ TEST(PartitionFile, SummaryAndFileOnlyFromProcessZero) {
   run.process_id = 0;
   PartitionMesh(m, ps, run);
   EXPECT_TRUE(std::filesystem::exists(dir.file("mine.zrnu")));
+}
+
+TEST(PartitionFile, KeysReadWithTheDomainPartitionItsRenumberedMesh) {
+  // The domain reads the keys beside number_of_domains and renumbers the
+  // mesh; a partition written from it reads back onto the mesh file's order.
+  TempDir dir;
+  const Mesh generated = Generated(CellLayout::kMixed, 12, 7);
+  WriteMeshAscii(generated, dir.file("basin.mesh"));
+  test::WriteTextFile(dir.file("run.toml"),
+                      "[VantorHD.DOMAIN]\nfile_name = \"basin.mesh\"\nnumber_of_domains = 0\n"
+                      "type_of_partitioning = 3\nwrite_partitioning = 1\n");
+  SktOpenFile(dir.file("run.toml"), false);
+  SktOpenTarget("VantorHD");
+  Domain domain;
+  ModuleSelection selection;
+  SetupSpaceDiscretization(domain, selection);
+  SktClose();
+  const DomainMesh& dm = domain.meshes[0];
+  EXPECT_TRUE(dm.partition.number_of_domains_given);
+  EXPECT_EQ(dm.partition.number_of_domains, 0);
+  EXPECT_EQ(dm.partition.type_of_partitioning, kPartitionNoMetis);
+  const Array1<int> part = PartitionMesh(dm.mesh, dm.partition, Processes(3));
+  const std::vector<int> count = Counts(part, 3);
+  for (int p = 1; p <= 3; ++p) EXPECT_NEAR(count[static_cast<std::size_t>(p)], dm.mesh.elements.nelements / 3.0, 1.0);
+
+  PartitionSettings back = Settings(kPartitionFile);
+  back.file_name_partitioning = dir.file("partitioning_3.zrnu");
+  Mesh in_file_order;
+  ReadMeshFile(in_file_order, dir.file("basin.mesh"));
+  SetupMeshGeometry(in_file_order);
+  const Array1<int> by_file = PartitionMesh(in_file_order, back, Processes(3));
+  for (int e = 1; e <= dm.mesh.elements.nelements; ++e)
+    ASSERT_EQ(by_file[dm.mesh.elements.file_index[e]], part[e]) << e;
 }
 
 }  // namespace
