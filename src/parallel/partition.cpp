@@ -41,14 +41,15 @@ Array1<double> ReadElementItem(const Mesh& mesh, const std::string& file, int it
   if (file.empty()) FatalError("PartitionMesh: no file given" + where);
   if (zrnFileKind(file) != 4) FatalError("PartitionMesh: " + ZrnLogName(file) + " is not a .zrnu file" + where);
   ZrnFile f;
-  ZrnOpenInput(f, file);
+  int status = 0;
+  if (ZrnOpenInput(f, file, &status) != kZrnOk)
+    FatalError("PartitionMesh: cannot open " + ZrnLogName(file) + where + ": " + zrnErrorText(status));
   auto refuse = [&](const std::string& text) {
     zrnHeaderDestroy(f);
     FatalError("PartitionMesh: " + ZrnLogName(file) + where + ": " + text);
   };
   if (!zrnIsMeshFileType(f.file_type)) refuse("not a flexible-mesh file");
   ZrnMeshData file_mesh;
-  int status = 0;
   if (zrnReadMesh(f, file_mesh, &status) != kZrnOk) refuse("cannot read its mesh: " + zrnErrorText(status));
   const std::string difference = MeshDifference(file_mesh, mesh);
   if (!difference.empty()) refuse("not on the mesh of the run: " + difference);
@@ -102,6 +103,8 @@ std::vector<idx_t> ElementWeights(const Mesh& mesh, const PartitionSettings& ps,
   std::vector<idx_t> w;
   if (ps.type_of_weighting == kWeightLayers) {
     if (mesh3d == nullptr || mesh3d->column_element_start.empty()) return w;
+    if (mesh3d->column_element_start.size() != ne + 1)
+      FatalError("PartitionMesh: the layered mesh is not built over the partitioned 2D mesh");
     w.resize(static_cast<std::size_t>(ne));
     for (int c = 1; c <= ne; ++c)
       w[static_cast<std::size_t>(c - 1)] = mesh3d->column_element_start[c + 1] - mesh3d->column_element_start[c];

@@ -331,7 +331,7 @@ TEST(PartitionFile, BadFilesAndItemsStop) {
     int item;
     const char* text;
   } cases[] = {
-      {"missing.zrnu", 1, "missing.zrnu"},
+      {"missing.zrnu", 1, "missing.zrnu (file_name_partitioning"},
       {"three.zrnu", 2, "item 2 asked for, the file has 1 items"},
       {"other.zrnu", 1, "not on the mesh of the run"},
       {"zero.zrnu", 1, "sub-domains count from 1"},
@@ -375,6 +375,31 @@ TEST(PartitionFile, SummaryAndFileOnlyFromProcessZero) {
   run.process_id = 0;
   PartitionMesh(m, ps, run);
   EXPECT_TRUE(std::filesystem::exists(dir.file("mine.zrnu")));
+}
+
+TEST(PartitionMesh, LayeredMeshSummaryCountsTheColumns) {
+  TempDir dir;
+  const Mesh m = Generated(CellLayout::kQuadrilaterals, 10, 6);
+  VerticalMesh v;
+  v.number_of_layers = 4;
+  CalcVerticalLevels(v, -10.0);
+  Mesh m3;
+  BuildLayeredMesh(m, v, m3);
+  PartitionSettings ps = Settings(kPartitionMetis5);
+  ps.type_of_weighting = kWeightLayers;
+  const std::string log = dir.file("run.log");
+  OpenLogFile(log);
+  const Array1<int> part = PartitionMesh(m, ps, Processes(2), 1, &m3);
+  CloseLogFile();
+  const std::vector<int> count = Counts(part, 2);
+  EXPECT_EQ(count[1], 30);
+  EXPECT_NE(test::ReadTextFile(log).find("  Partition    Total elements           Domains\n" +
+                                         fmt::format("  {:9d}{:18d}{:18d}\n", 1, 4 * count[1], 1) +
+                                         fmt::format("  {:9d}{:18d}{:18d}\n", 2, 4 * count[2], 1)),
+            std::string::npos);
+  Mesh other;
+  BuildLayeredMesh(Generated(CellLayout::kQuadrilaterals, 9, 6), v, other);
+  EXPECT_FATAL(PartitionMesh(m, ps, Processes(2), 1, &other), "not built over the partitioned 2D mesh");
 }
 
 TEST(PartitionFile, KeysReadWithTheDomainPartitionItsRenumberedMesh) {
