@@ -44,6 +44,8 @@ void SetupOneMesh(DomainMesh& dm, int number, int number_of_dimensions) {
     if (mesh.ndim == 2) {
       SktReadKeyword("number_of_domains", dm.number_of_domains, 16);
       SktReadKeyword("type_of_reordering", dm.type_of_reordering, kReorderHilbert);
+      dm.partition.number_of_domains = dm.number_of_domains;
+      ReadPartitionKeys(dm.partition, number_of_dimensions);
       if (dm.type_of_reordering != kReorderNone)
         ReorderMesh(mesh, ElementOrder(mesh, dm.type_of_reordering, 1, mesh.elements.nelements));
     }

@@ -21,6 +21,7 @@
 
 #include "core/run.hpp"
 #include "mesh/mesh.hpp"
+#include "mesh/partition_keys.hpp"
 
 namespace vhd {
 
@@ -35,6 +36,7 @@ struct DomainMesh {
   double thresshold_depth = 0.0;
   int number_of_domains = 16;
   int type_of_reordering = 1;
+  PartitionSettings partition;  // keys of the partitioning (2D meshes)
 };
 
 struct Domain {

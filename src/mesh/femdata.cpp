@@ -235,24 +235,9 @@ void MapGrid(DataFileState& st, const FemDataRequest& r, const ZrnSpatialAxis& a
             ZrnLogName(st.file.name) + "; they take the values at its edge");
 }
 
-// The mesh of a .zrnu file must be the caller's as read from its mesh file:
-// same counts, same element nodes in the file's numbering.
 void CheckSameMesh(const ZrnMeshData& fm, const Mesh& m, const std::string& file) {
-  const ElementTable& el = m.elements;
-  const Array1<int> in_file_order = FileOrder(el.file_index, el.nelements);
-  if (fm.nnodes() != m.nodes.nnodes || fm.nelements() != el.nelements)
-    Refuse("Wrong data file", file,
-           "the file's mesh has " + std::to_string(fm.nnodes()) + " nodes and " +
-               std::to_string(fm.nelements()) + " elements, the model's " +
-               std::to_string(m.nodes.nnodes) + " and " + std::to_string(el.nelements));
-  for (int k = 1; k <= el.nelements; ++k) {
-    const int e = in_file_order[k];
-    const int n = ElementNodeCount(el, e);
-    bool same = fm.node_start[k + 1] - fm.node_start[k] == n;
-    for (int j = 1; same && j <= n; ++j)
-      same = fm.node_list[fm.node_start[k] + j - 1] == FileIndex(m.nodes.file_index, ElementNode(el, e, j));
-    if (!same) Refuse("Wrong data file", file, "element " + std::to_string(k) + " has other nodes");
-  }
+  const std::string difference = MeshDifference(fm, m);
+  if (!difference.empty()) Refuse("Wrong data file", file, difference);
 }
 
 // Area coordinates of (x, y) in the triangle of nodes a, b, c, or false when
@@ -626,6 +611,23 @@ void OpenFile(DataSpec& spec, const FemDataRequest& request, const ZrnDateTime& 
 }
 
 }  // namespace
+
+std::string MeshDifference(const ZrnMeshData& fm, const Mesh& m) {
+  const ElementTable& el = m.elements;
+  const Array1<int> in_file_order = FileOrder(el.file_index, el.nelements);
+  if (fm.nnodes() != m.nodes.nnodes || fm.nelements() != el.nelements)
+    return "the file's mesh has " + std::to_string(fm.nnodes()) + " nodes and " + std::to_string(fm.nelements()) +
+           " elements, the model's " + std::to_string(m.nodes.nnodes) + " and " + std::to_string(el.nelements);
+  for (int k = 1; k <= el.nelements; ++k) {
+    const int e = in_file_order[k];
+    const int n = ElementNodeCount(el, e);
+    bool same = fm.node_start[k + 1] - fm.node_start[k] == n;
+    for (int j = 1; same && j <= n; ++j)
+      same = fm.node_list[fm.node_start[k] + j - 1] == FileIndex(m.nodes.file_index, ElementNode(el, e, j));
+    if (!same) return "element " + std::to_string(k) + " has other nodes";
+  }
+  return {};
+}
 
 void FemDataOpen(DataSpec& spec, const FemDataRequest& request, const ZrnDateTime& start,
                  double duration) {

@@ -78,6 +78,11 @@ double FemDataValue(DataSpec& spec, int k, double t, int target = 1);
 // Number of targets of an opened input definition.
 int FemDataTargets(const DataSpec& spec);
 
+// Empty when the mesh of a .zrnu file is the model's mesh as read from its
+// mesh file (same counts, same element nodes in the file's numbering), else
+// what differs ("element 7 has other nodes").
+std::string MeshDifference(const ZrnMeshData& file_mesh, const Mesh& mesh);
+
 // Closes the file (its summary goes to the log).
 void FemDataClose(DataSpec& spec);
 
