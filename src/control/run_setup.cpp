@@ -11,6 +11,7 @@
 #include "io/setup.hpp"
 #include "log/log.hpp"
 #include "parallel/message_passing.hpp"
+#include "parallel/partition.hpp"
 
 namespace vhd {
 
@@ -110,11 +111,9 @@ void SetupDomain(const RunControl& run, Domain& domain, ModuleSelection& selecti
   if (domain.number_of_meshes != 1 || domain.number_of_dimensions != 2 || mesh.ndim != 2)
     FatalError("SetupDomain: a run on several processes needs one 2D mesh (number_of_meshes 1, "
                "number_of_dimensions 2)");
-  const int ne = mesh.elements.nelements;
-  Array1<int> part(ne, 1);
-  for (int e = 1; e <= ne; ++e)
-    part[e] = 1 + static_cast<int>(static_cast<long long>(e - 1) * run.nprocesses / ne);
-  SetupSubdomain(mesh, part, 2, run, sub);
+  const PartitionSettings& ps = domain.meshes[0].partition;
+  const Array1<int> part = PartitionMesh(mesh, ps, run, run.nmachines);
+  SetupSubdomain(mesh, part, ps.type_of_halo_layer, run, sub);
   PrintMeshSummary(mesh, 0, true);
 }
 

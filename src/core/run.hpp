@@ -17,6 +17,7 @@ inline constexpr int kRunStopRequested = 1;  // the host asked to stop (kill fil
 struct RunControl {
   int process_id = -1;  // message-passing rank from 0; -1 for a single process
   int nprocesses = 1;
+  int nmachines = 1;  // machines the processes run on
   int nthreads = 1;
   int run_status = kRunNormal;
   std::string setup_file;

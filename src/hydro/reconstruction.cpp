@@ -22,6 +22,11 @@ void LimitedGradient(const HdModule& hd, HdSolver& s, const Mesh& mesh, const Ar
 
 void SetupReconstructionHD(const HdModule& hd, const Mesh& mesh, HdSolver& s) {
   const HdSolutionTechnique& sol = hd.solution;
+  // A gradient stencil reaches two rings of neighbours (the second ring
+  // where the first is short, at boundaries and for the wider stencils).
+  if (hd.subdomain && hd.subdomain->Active() && hd.subdomain->halo_layers < 2)
+    FatalError("SetupReconstructionHD: type_of_halo_layer 1 is too thin for the gradients of the "
+               "second-order scheme and of the eddy viscosity; use type_of_halo_layer 2");
   // The permanent layout: every element active, every face open.
   SetupGradient(mesh, sol.gradient_calculation, Array1<int>(), Array1<int>(), 2, sol.boundary_correction, 0,
                 s.gradient);

@@ -105,7 +105,7 @@ int AgreeRunStatus(int status, const RunControl& run) {
   return global[0] < 0 ? global[0] : global[1];
 }
 
-void WriteComputingEnvironment(const RunControl& run, int max_threads, int nprocessors) {
+void WriteComputingEnvironment(RunControl& run, int max_threads, int nprocessors) {
   char name[MPI_MAX_PROCESSOR_NAME] = {};
   int length = 0;
   if (MpiActive())
@@ -122,6 +122,7 @@ void WriteComputingEnvironment(const RunControl& run, int max_threads, int nproc
   for (int p = 0; p < run.nprocesses; ++p)
     ++machines[std::string(all.data() + static_cast<std::size_t>(p) * MPI_MAX_PROCESSOR_NAME)];
 
+  run.nmachines = static_cast<int>(machines.size());
   WriteBanner("Computing Environment");
   WriteValueLine("Local processor name : %", name);
   WriteValueLine("Number of processes  : %", run.nprocesses);

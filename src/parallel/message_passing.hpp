@@ -34,7 +34,8 @@ int AgreeRunStatus(int status, const RunControl& run);
 
 // The "Computing Environment" block of the log: processor names, counts of
 // processes, processors, threads and machines.
-void WriteComputingEnvironment(const RunControl& run, int max_threads, int nprocessors);
+// Sets run.nmachines.
+void WriteComputingEnvironment(RunControl& run, int max_threads, int nprocessors);
 
 // Timers of the message-passing calls (only used with several processes).
 TimingSet& MpiTimings();
