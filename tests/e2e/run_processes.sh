@@ -1,0 +1,213 @@
+# Runs on 1, 2 and 4 message-passing processes (and 2 processes of 2
+# threads) give the same results: every value of every output file, the
+# volume balance and the mass budget over a polygon that crosses the
+# sub-domains. Two cases: the bundled tidal example (flooding and drying of a
+# flat) and a flood from a discharge boundary onto a dry slope of triangles
+# and quadrilaterals, second order, which must also take in the prescribed
+# volume in full. Skipped without mpirun.
+. ./driver_common.inc
+export TANO_PROGRESS=NONE
+PY=/usr/bin/python3
+
+if ! command -v mpirun > /dev/null 2>&1; then
+  echo "mpirun not found: skipped"
+  exit 0
+fi
+EXAMPLE=$(cd ../../examples/default && pwd)
+
+# run_case DIR NPROCESSES NTHREADS: runs DIR/setup.toml in a copy DIR_nN_tT.
+run_case() {
+  r="$1_n$2_t$3"
+  mkdir -p "$r"
+  cp "$1"/* "$r"/
+  if [ "$2" -eq 1 ]; then
+    OMP_NUM_THREADS=$3 timeout 600 "$VANTORHD" "$r/setup.toml" > "$r/out" 2>&1
+  else
+    OMP_NUM_THREADS=$3 timeout 600 mpirun --allow-run-as-root --oversubscribe -np "$2" \
+      "$VANTORHD" "$r/setup.toml" > "$r/out" 2>&1
+  fi
+  status_is 0 $? "$r"
+  contains "$r/setup.log" "  Normal run completion"
+}
+
+# same_results REFERENCE OTHER: the result files and the volume balance agree.
+same_results() {
+  sed -n '/= Volume balance =/,/Volume defect/p' "$1/setup.log" > "$1/balance"
+  sed -n '/= Volume balance =/,/Volume defect/p' "$2/setup.log" > "$2/balance"
+  [ -s "$1/balance" ] || fail "$1: no volume balance in the log"
+  cmp -s "$1/balance" "$2/balance" || fail "volume balance of $2 differs from $1"
+  if ! "$PY" - "$1" "$2" > "$2/compare.out" 2>&1 <<'PY'
+import glob, os, sys
+import numpy as np
+import netCDF4
+a, b = sys.argv[1], sys.argv[2]
+bad = []
+files = [f for f in sorted(glob.glob(os.path.join(a, "*.zrn*"))) if not os.path.basename(f).startswith("tide")]
+if not files:
+    bad.append("no result files")
+for fa in files:
+    fb = os.path.join(b, os.path.basename(fa))
+    with netCDF4.Dataset(fa) as da, netCDF4.Dataset(fb) as db:
+        if set(da.variables) != set(db.variables):
+            bad.append(f"{fb}: other variables")
+            continue
+        for v in da.variables:
+            x, y = np.ma.getdata(da.variables[v][:]), np.ma.getdata(db.variables[v][:])
+            if x.shape != y.shape or not np.array_equal(x, y, equal_nan=x.dtype.kind == "f"):
+                bad.append(f"{fb}: {v} differs")
+print("\n".join(bad))
+sys.exit(1 if bad else 0)
+PY
+  then
+    fail "results of $2 differ from $1"
+    cat "$2/compare.out"
+  fi
+}
+
+# ---- the bundled example -----------------------------------------------------
+
+d=$(case_dir tide)
+cp "$EXAMPLE/setup.toml" "$EXAMPLE/flat.mesh" "$EXAMPLE/tide.zrn0" "$d/"
+sed -i 's/^number_of_time_steps = .*/number_of_time_steps = 30/' "$d/setup.toml"
+run_case "$d" 1 2
+for layout in "2 1" "4 1" "2 2"; do
+  set -- $layout
+  run_case "$d" "$1" "$2"
+  same_results "${d}_n1_t2" "${d}_n$1_t$2"
+done
+contains "${d}_n2_t1/setup.log" "Number of partitions: 2"
+contains "${d}_n4_t1/setup.log" " External layer"
+
+# ---- a flood onto a dry slope ------------------------------------------------
+
+d=$(case_dir slope)
+"$PY" - "$d/slope.mesh" <<'PYMESH'
+import sys
+# 1200 m x 300 m of 50 m cells, quadrilaterals west of x = 600 m and
+# triangles east of it; the bed rises from 2 m below datum in the west to
+# 2 m above it in the east, with a mound; open in the west (code 2).
+nx, ny, d = 24, 6, 50.0
+def bed(x, y):
+    mound = 1.5 if (x - 800.0) ** 2 + (y - 150.0) ** 2 < 100.0 ** 2 else 0.0
+    return -2.0 + 4.0 * x / (nx * d) + mound
+def code(i, j):
+    if i == 0 and 0 < j < ny: return 2
+    return 1 if i in (0, nx) or j in (0, ny) else 0
+nodes = [(j * (nx + 1) + i + 1, i * d, j * d) for j in range(ny + 1) for i in range(nx + 1)]
+elements = []
+for j in range(ny):
+    for i in range(nx):
+        a = j * (nx + 1) + i + 1
+        b, c, e = a + 1, a + nx + 2, a + nx + 1
+        elements += [(a, b, c, e)] if i < nx // 2 else [(a, b, c, 0), (a, c, e, 0)]
+with open(sys.argv[1], "w") as f:
+    f.write(f"100079 1000 {len(nodes)} UTM-32\n")
+    for k, x, y in nodes:
+        f.write(f"{k} {500000 + x:.1f} {6000000 + y:.1f} {bed(x, y):.3f} {code(round(x / d), round(y / d))}\n")
+    f.write(f"{len(elements)} 4 25\n")
+    for k, el in enumerate(elements, 1):
+        f.write(f"{k} {' '.join(map(str, el))}\n")
+PYMESH
+cat > "$d/setup.toml" <<'SETUP'
+[VantorHD]
+
+[VantorHD.TIME]
+start_time = [2004, 1, 1, 0, 0, 0]
+time_step_interval = 30.0
+number_of_time_steps = 40
+
+[VantorHD.DOMAIN]
+file_name = "slope.mesh"
+
+[VantorHD.MODULE_SELECTION]
+mode_of_hydrodynamic_module = 2
+
+[VantorHD.HYDRODYNAMIC_MODULE]
+mode = 2
+
+[VantorHD.HYDRODYNAMIC_MODULE.SOLUTION_TECHNIQUE]
+scheme_of_time_integration = 2
+scheme_of_space_discretization_horizontal = 2
+
+[VantorHD.HYDRODYNAMIC_MODULE.FLOOD_AND_DRY]
+type = 2
+
+[VantorHD.HYDRODYNAMIC_MODULE.BED_RESISTANCE]
+type = 4
+[VantorHD.HYDRODYNAMIC_MODULE.BED_RESISTANCE.MANNING_NUMBER]
+format = 0
+constant_value = 32.0
+
+[VantorHD.HYDRODYNAMIC_MODULE.INITIAL_CONDITIONS]
+type = 1
+surface_elevation_constant = -1.0
+
+[VantorHD.HYDRODYNAMIC_MODULE.BOUNDARY_CONDITIONS.CODE_1]
+type = 1
+
+[VantorHD.HYDRODYNAMIC_MODULE.BOUNDARY_CONDITIONS.CODE_2]
+type = 7
+constant_value = 25.0
+type_of_soft_start = 0
+
+[VantorHD.HYDRODYNAMIC_MODULE.OUTPUTS]
+number_of_outputs = 3
+
+[VantorHD.HYDRODYNAMIC_MODULE.OUTPUTS.OUTPUT_1]
+file_name = "area.zrnu"
+format = 2
+time_step_frequency = 10
+[VantorHD.HYDRODYNAMIC_MODULE.OUTPUTS.OUTPUT_1.PARAMETERS_2D]
+SURFACE_ELEVATION = true
+TOTAL_WATER_DEPTH = true
+U_VELOCITY = true
+V_VELOCITY = true
+WET_DRY_CODE = true
+MAXIMUM_CURRENT_SPEED = true
+
+[VantorHD.HYDRODYNAMIC_MODULE.OUTPUTS.OUTPUT_2]
+file_name = "budget.zrn0"
+type = 3
+format = 0
+[VantorHD.HYDRODYNAMIC_MODULE.OUTPUTS.OUTPUT_2.MASSBUDGET]
+number_of_points = 4
+[VantorHD.HYDRODYNAMIC_MODULE.OUTPUTS.OUTPUT_2.MASSBUDGET.POINT_1]
+x = 500320.0
+y = 5999900.0
+[VantorHD.HYDRODYNAMIC_MODULE.OUTPUTS.OUTPUT_2.MASSBUDGET.POINT_2]
+x = 500910.0
+y = 5999900.0
+[VantorHD.HYDRODYNAMIC_MODULE.OUTPUTS.OUTPUT_2.MASSBUDGET.POINT_3]
+x = 500910.0
+y = 6000180.0
+[VantorHD.HYDRODYNAMIC_MODULE.OUTPUTS.OUTPUT_2.MASSBUDGET.POINT_4]
+x = 500320.0
+y = 6000180.0
+
+[VantorHD.HYDRODYNAMIC_MODULE.OUTPUTS.OUTPUT_3]
+file_name = "section.zrn0"
+type = 4
+format = 1
+[VantorHD.HYDRODYNAMIC_MODULE.OUTPUTS.OUTPUT_3.LINE]
+x_first = 500420.0
+y_first = 5999990.0
+x_last = 500420.0
+y_last = 6000310.0
+[VantorHD.HYDRODYNAMIC_MODULE.OUTPUTS.OUTPUT_3.DISCHARGE]
+DISCHARGE = true
+ACCUMULATED_DISCHARGE = true
+SETUP
+run_case "$d" 1 1
+for layout in "2 1" "4 1"; do
+  set -- $layout
+  run_case "$d" "$1" "$2"
+  same_results "${d}_n1_t1" "${d}_n$1_t$2"
+done
+# The discharge boundary takes in 25 m3/s x 1200 s in full on every layout.
+for r in "${d}_n1_t1" "${d}_n4_t1"; do
+  inflow=$(sed -n 's/^ *Total volume from boundaries (m\*\*3) *: *//p' "$r/setup.log")
+  "$PY" -c "import sys; v = float('$inflow'); sys.exit(0 if abs(v - 30000.0) <= 300.0 else 1)" ||
+    fail "$r: boundary volume $inflow, expected 30000 m3 within 1 %"
+done
+
+finish
