@@ -209,6 +209,12 @@ void ExchangeHalo(Subdomain& sub, std::initializer_list<Array1<double>*> fields,
   if (!sub.Active()) return;
   const int nf = static_cast<int>(fields.size() + codes.size());
   if (nf > kMaxExchangeFields) FatalError("ExchangeHalo: too many fields in one exchange");
+  TimingSet& timing = MpiTimings();
+  const bool timed = !timing.timers.empty();
+  if (timed) {
+    StartTiming(timing, kMpiTimerTotal);
+    StartTiming(timing, kMpiTimerHalo);
+  }
   const int nlinks = static_cast<int>(sub.links.size());
   for (int l = 0; l < nlinks; ++l) {
     const Subdomain::Link& link = sub.links[static_cast<std::size_t>(l)];
@@ -237,6 +243,10 @@ void ExchangeHalo(Subdomain& sub, std::initializer_list<Array1<double>*> fields,
       for (Array1<double>* a : fields) (*a)[e] = buf[k++];
       for (Array1<int>* a : codes) (*a)[e] = static_cast<int>(buf[k++]);
     }
+  }
+  if (timed) {
+    StopTiming(timing, kMpiTimerHalo);
+    StopTiming(timing, kMpiTimerTotal);
   }
 }
 
