@@ -58,7 +58,8 @@ void HdDriverModule::PrintStatistics() {
 void HdDriverModule::PrintTimings() { vhd::PrintTimings(hd_.timing); }
 
 double HdDriverModule::MeshSizeFigure() const {
-  return mesh_ ? static_cast<double>(mesh_->elements.nelements) : 0.0;
+  // Owned elements: the figure is summed over the processes.
+  return mesh_ ? static_cast<double>(mesh_->elements.nelements_int) : 0.0;
 }
 
 }  // namespace vhd
