@@ -2,6 +2,7 @@
 // WIND_FRICTION) and TIDAL_POTENTIAL of the HD module, their checks and
 // messages.
 
+#include <algorithm>
 #include <array>
 #include <cmath>
 #include <string>
@@ -16,12 +17,17 @@ namespace vhd {
 
 namespace {
 
-std::string Where(std::string_view key, const std::string& value) {
-  return " (" + std::string(key) + " = " + value + " in " + SktSectionPath() + ")";
+// " (key = value in section; expected)".
+std::string Where(std::string_view key, const std::string& value, std::string_view expected = {}) {
+  return " (" + std::string(key) + " = " + value + " in " + SktSectionPath() +
+         (expected.empty() ? "" : "; " + std::string(expected)) + ")";
 }
 
 std::string Text(int v) { return std::to_string(v); }
-std::string Text(double v) { return NumberText(v); }
+std::string Text(double v) {
+  const std::string t = NumberText(v);
+  return t.substr(std::min(t.find_first_not_of(' '), t.size()));
+}
 
 }  // namespace
 
@@ -91,8 +97,7 @@ void SetupWindHD(HdModule& hd) {
   SktReadKeyword("neutral_pressure", neutral_hpa, 1013.0);
   w.neutral_pressure = 100.0 * neutral_hpa;
   if (!(w.neutral_pressure >= 44400.0 && w.neutral_pressure <= 199900.0)) {
-    FatalError("Invalid neutral pressure" + Where("neutral_pressure", Text(neutral_hpa)) +
-               ", 444 to 1999 hPa expected");
+    FatalError("Invalid neutral pressure" + Where("neutral_pressure", Text(neutral_hpa), "444 to 1999 hPa expected"));
   }
   SktReadKeyword("type_of_soft_start", w.type_of_soft_start, 2);
   SktReadKeyword("soft_time_interval", w.soft_time_interval, 0.0);
@@ -105,7 +110,7 @@ void SetupWindHD(HdModule& hd) {
   if (friction) {
     SktReadKeyword("type", w.friction_type, 1);
     if (w.friction_type != 0 && w.friction_type != 1) {
-      FatalError("Wind friction type not" + Where("type", Text(w.friction_type)) + ", 0 or 1 expected");
+      FatalError("Wind friction type not" + Where("type", Text(w.friction_type), "0 or 1 expected"));
     }
     if (w.friction_type == 0) {
       SktReadKeyword("constant_friction", w.constant_friction, 0.0026);
@@ -115,8 +120,8 @@ void SetupWindHD(HdModule& hd) {
       SktReadKeyword("linear_friction_high", w.friction_high, 0.0026);
       SktReadKeyword("linear_speed_high", w.speed_high, 24.0);
       if (!(w.speed_high > w.speed_low)) {
-        FatalError("SetupWindHD: linear_speed_high must exceed linear_speed_low (" + NumberText(w.speed_high) +
-                   " and " + NumberText(w.speed_low) + " in " + SktSectionPath() + ")");
+        FatalError("SetupWindHD: linear_speed_high must exceed linear_speed_low (" + Text(w.speed_high) +
+                   " and " + Text(w.speed_low) + " in " + SktSectionPath() + ")");
       }
     }
     SktCloseSection();
@@ -157,8 +162,7 @@ void SetupTideHD(HdModule& hd) {
   if (tp.type == 1) {
     SktReadKeyword("format", tp.format, 0);
     if (tp.format != 0) {
-      FatalError("Format not supported for tide conditions" + Where("format", Text(tp.format)) +
-                 ", 0: constituents in CONSTITUENT sections");
+      FatalError("Format not supported for tide conditions" + Where("format", Text(tp.format), "0: constituents in CONSTITUENT sections"));
     }
     SktReadKeyword("period_scaling", tp.period_scaling, 1.0);
     int n = 0;
@@ -192,7 +196,7 @@ void SetupTideHD(HdModule& hd) {
       }
       c.period *= tp.period_scaling;
       if (!(c.period > 0.0) || !std::isfinite(c.period)) {
-        FatalError("SetupTide: period = " + NumberText(c.period) + " s in " + SktSectionPath() +
+        FatalError("SetupTide: period = " + Text(c.period) + " s in " + SktSectionPath() +
                    " (period times period_scaling must be positive)");
       }
       SktCloseSection();
