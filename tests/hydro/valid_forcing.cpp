@@ -277,3 +277,85 @@ TEST(ForcingCoriolis, GeostrophicCurrentStaysInBalance) {
 
 }  // namespace
 }  // namespace vhd::test
+
+namespace vhd::test {
+namespace {
+
+// A closed basin forced only by the tidal potential of one semi-diurnal
+// constituent: 2 degrees of longitude on the equator, 1000 m deep, so that
+// its gravest seiche (about 75 min) is far shorter than the constituent's
+// 12.42 h and the surface follows the equilibrium tide quasi-statically. The
+// east-west difference of the surface, fitted at the constituent's frequency
+// over its second and third periods, has the amplitude and phase of that of
+// the equilibrium tide (minus its basin mean, which a closed basin cannot
+// follow).
+TEST(ForcingTidePotential, ClosedBasinRespondsAtTheConstituentsPeriod) {
+  constexpr double kRad = kPi / 180.0;
+  SwCase c;
+  RectangleMeshSpec spec;
+  spec.x0 = 0.0, spec.x1 = 2.0 * kRad;
+  spec.y0 = -1.0 * kRad, spec.y1 = 1.0 * kRad;
+  spec.nx = spec.ny = 16;
+  spec.layout = CellLayout::kMixed;
+  spec.projection = "LONG/LAT";
+  spec.bed = [](double, double) { return -1000.0; };
+  MakeCase(c, spec, 600.0);
+  SetScheme(c.hd, 1, 2);
+  HdTidalPotential& tp = c.hd.forcing.tide;
+  tp.type = 1;
+  TidalConstituent m2;
+  m2.species = 2;
+  m2.amplitude = 0.24;
+  m2.period = 12.42 * 3600.0;
+  tp.constituents = {m2};
+  StartCase(c, [](double, double) { return 0.0; });
+  const HdState& st = c.hd.state;
+  const double w = 2.0 * kPi / m2.period;
+  // East minus west mean of a field over the outer columns of elements.
+  auto difference = [&](const Array1<double>& q) {
+    double east = 0, west = 0, ne = 0, nw = 0;
+    for (int e = 1; e <= st.nelements; ++e) {
+      const double x = c.mesh.elements.xc[e];
+      if (x > 1.8 * kRad) east += q[e], ne += 1;
+      if (x < 0.2 * kRad) west += q[e], nw += 1;
+    }
+    return east / ne - west / nw;
+  };
+  // Least squares of a cos(wt) + b sin(wt) + m for the surface and for the
+  // equilibrium tide.
+  double S[3][3] = {}, r[2][3] = {};
+  for (int k = 1; k <= static_cast<int>(3 * m2.period / 600.0); ++k) {
+    RunTo(c, k * 600.0);
+    if (c.t < m2.period) continue;
+    const double base[3] = {std::cos(w * c.t), std::sin(w * c.t), 1.0};
+    const double y[2] = {difference(st.eta), difference(tp.eta_eq)};
+    for (int i = 0; i < 3; ++i) {
+      for (int j = 0; j < 3; ++j) S[i][j] += base[i] * base[j];
+      for (int m = 0; m < 2; ++m) r[m][i] += base[i] * y[m];
+    }
+  }
+  ASSERT_GE(c.run_status, 0);
+  double amp[2], phase[2];
+  for (int m = 0; m < 2; ++m) {
+    // Cramer's rule on the 3 x 3 normal equations.
+    auto det = [](double A[3][3]) {
+      return A[0][0] * (A[1][1] * A[2][2] - A[1][2] * A[2][1]) - A[0][1] * (A[1][0] * A[2][2] - A[1][2] * A[2][0]) +
+             A[0][2] * (A[1][0] * A[2][1] - A[1][1] * A[2][0]);
+    };
+    double coef[3];
+    for (int i = 0; i < 3; ++i) {
+      double A[3][3];
+      for (int a = 0; a < 3; ++a)
+        for (int b = 0; b < 3; ++b) A[a][b] = b == i ? r[m][a] : S[a][b];
+      coef[i] = det(A) / det(S);
+    }
+    amp[m] = std::hypot(coef[0], coef[1]);
+    phase[m] = std::atan2(coef[1], coef[0]);
+  }
+  EXPECT_GT(amp[1], 1e-3);
+  EXPECT_NEAR(amp[0] / amp[1], 1.0, 0.05) << amp[0] << " " << amp[1];
+  EXPECT_NEAR(std::remainder(phase[0] - phase[1], 2.0 * kPi), 0.0, 0.05);
+}
+
+}  // namespace
+}  // namespace vhd::test
