@@ -273,16 +273,21 @@ void UPDATEWIND(HdModule& hd, double t) {
   double* p = w.pressure.data();
   const double *mp = w.map_p.data(), *mu = w.map_u.data(), *mv = w.map_v.data();
   const HdWindForcing& wc = w;
+  // Where the map holds no value (its delete value, or not a number) the air
+  // is calm at the neutral pressure.
+  const double del = w.data.state.open ? w.data.state.file.delete_value : kZrnDefaultDeleteValue;
+  auto given = [del](double x) { return x != del && std::isfinite(x); };
   VHD_OMP_PARALLEL_FOR
   for (int e = 1; e <= nown; ++e) {
     const double ca = turn ? nc[e] : 1.0, sa = turn ? ns[e] : 0.0;
-    const double u = s * (mu[e] * ca + mv[e] * sa);
-    const double v = s * (mv[e] * ca - mu[e] * sa);
+    const bool calm = !given(mu[e]) || !given(mv[e]);
+    const double u = calm ? 0.0 : s * (mu[e] * ca + mv[e] * sa);
+    const double v = calm ? 0.0 : s * (mv[e] * ca - mu[e] * sa);
     const double speed = std::sqrt(u * u + v * v);
     const double c = WindFrictionHD(wc, speed) / kWaterOverAirDensity * speed;
     wx[e] = c * u;
     wy[e] = c * v;
-    p[e] = 100.0 * s * mp[e] + (1.0 - s) * pn;
+    p[e] = given(mp[e]) ? 100.0 * s * mp[e] + (1.0 - s) * pn : pn;
   }
   // The pressure gradient reads the neighbours' pressure.
   if (hd.subdomain) ExchangeHalo(*hd.subdomain, {&w.pressure});

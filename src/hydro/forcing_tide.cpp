@@ -115,6 +115,11 @@ void UPDATETIDE(HdModule& hd, double t) {
   const int nown = st.nelements_owned;
   if (tp.type == 2) {
     FemDataRead(tp.data, 1, t, tp.eta_eq);
+    // No equilibrium tide where the file holds no value.
+    const double del = tp.data.state.open ? tp.data.state.file.delete_value : kZrnDefaultDeleteValue;
+    for (int e = 1; e <= nown; ++e) {
+      if (tp.eta_eq[e] == del || !std::isfinite(tp.eta_eq[e])) tp.eta_eq[e] = 0.0;
+    }
   } else if (tp.type == 1 || tp.type == 3) {
     // Arguments and amplitude factors once per update.
     const double T = (t / 86400.0 + tp.start_days) / 36525.0;

@@ -81,6 +81,27 @@ TEST(ForcingSetup, SoftStartGrowsTheWindAndMovesThePressure) {
   }
 }
 
+// Where a map holds no value the air is calm at the neutral pressure (no
+// jump of the pressure to zero next to it).
+TEST(ForcingSetup, MapWithoutValueIsCalmAtTheNeutralPressure) {
+  for (double missing : {kZrnDefaultDeleteValue, std::nan("")}) {
+    HdModule hd;
+    HdWindForcing& w = hd.forcing.wind;
+    w.type = 1;
+    w.format = 3;
+    InitDataSpec(w.data, 3, {missing, 5.0, missing});
+    w.data.type_of_soft_start = kSoftStartNone;
+    Mesh mesh = MakeMesh(2, 2, 10.0, 10.0, test::Flat(2.0));
+    AllocateStateHD(hd, mesh);
+    HdSolver s;
+    SetupSolverHD(hd, mesh, s);
+    UPDATEWIND(hd, 100.0);
+    EXPECT_EQ(w.pressure[2], 101300.0);
+    EXPECT_EQ(hd.boundary.forcing.wind_x[2], 0.0);
+    EXPECT_EQ(hd.boundary.forcing.wind_y[2], 0.0);
+  }
+}
+
 TEST(ForcingSetup, CoriolisParameterFromTheLatitude) {
   const double two_omega = 2.0 * 7.292e-5;
   {
