@@ -3,10 +3,11 @@
 //
 //   bench_forcing [--benchmark_filter=...]
 // Counters: Melem_stages_per_s (elements x stages / wall-clock s) and
-// Melem_stages_per_cpu_s (per CPU-second of all threads). With forcing:
-// wind and air pressure as a map of format 3 (values per element at every
-// step; a constant map, so the time is that of the update, not of a file),
-// and Coriolis of type 1.
+// Melem_stages_per_cpu_s (per CPU-second of all threads). Argument forcing:
+// 0 none; 1 wind and air pressure as a map of format 3 (values per element
+// at every step; a constant map, so the time is that of the update, not of
+// reading a file) and Coriolis of type 1; 2 Coriolis only; 3 a uniform wind
+// (format 0) only.
 
 #include <benchmark/benchmark.h>
 
@@ -33,7 +34,7 @@ struct Case {
 
 // A square basin of random jittered triangles (2 n^2 elements) in UTM zone
 // 32 with a sloping bed and a tilted surface, as bench_hd_step.
-std::unique_ptr<Case> MakeCase(int elements, int order, bool forcing) {
+std::unique_ptr<Case> MakeCase(int elements, int order, int forcing) {
   auto c = std::make_unique<Case>();
   RectangleMeshSpec spec;
   const int n = static_cast<int>(std::lround(std::sqrt(elements / 2.0)));
@@ -61,12 +62,19 @@ std::unique_ptr<Case> MakeCase(int elements, int order, bool forcing) {
   s.preserve_dU = order == 2;
   s.face_average_d = order == 2 ? 1 : 0;
   s.face_limit_dry = order == 2;
-  if (forcing) {
-    HdWindForcing& w = hd.forcing.wind;
+  HdWindForcing& w = hd.forcing.wind;
+  if (forcing == 1) {
     w.type = 1;
     w.format = 3;
     InitDataSpec(w.data, 3, {990.0, 12.0, -5.0});
     w.data.type_of_soft_start = kSoftStartNone;
+  } else if (forcing == 3) {
+    w.type = 1;
+    w.format = 0;
+    w.constant_speed = 13.0;
+    w.constant_direction = 290.0;
+  }
+  if (forcing == 1 || forcing == 2) {
     hd.forcing.coriolis.type = 1;
     hd.forcing.coriolis.coefficient_given = true;
     hd.forcing.coriolis.coefficient = 1.2e-4;
@@ -87,7 +95,7 @@ void BM_HdStepForcing(benchmark::State& state) {
   const int elements = static_cast<int>(state.range(0));
   const int order = static_cast<int>(state.range(1));
   const int threads = static_cast<int>(state.range(2));
-  const bool forcing = state.range(3) != 0;
+  const int forcing = static_cast<int>(state.range(3));
   OmpSetThreads(threads);
   auto c = MakeCase(elements, order, forcing);
   int status = 0;
@@ -112,6 +120,8 @@ BENCHMARK(BM_HdStepForcing)
     ->ArgNames({"elements", "order", "threads", "forcing"})
     ->Args({1'000'000, 1, 1, 0})
     ->Args({1'000'000, 1, 1, 1})
+    ->Args({1'000'000, 1, 1, 2})
+    ->Args({1'000'000, 1, 1, 3})
     ->Args({1'000'000, 2, 1, 0})
     ->Args({1'000'000, 2, 1, 1})
     ->Args({1'000'000, 2, 2, 0})

@@ -5,6 +5,7 @@
 #include <gtest/gtest.h>
 
 #include <cmath>
+#include <memory>
 #include <numbers>
 
 #include "io/units.hpp"
@@ -355,6 +356,53 @@ TEST(ForcingTidePotential, ClosedBasinRespondsAtTheConstituentsPeriod) {
   EXPECT_GT(amp[1], 1e-3);
   EXPECT_NEAR(amp[0] / amp[1], 1.0, 0.05) << amp[0] << " " << amp[1];
   EXPECT_NEAR(std::remainder(phase[0] - phase[1], 2.0 * kPi), 0.0, 0.05);
+}
+
+}  // namespace
+}  // namespace vhd::test
+
+namespace vhd::test {
+namespace {
+
+// Wind, air pressure and Coriolis over a sloping beach give the same bits on
+// one and two threads.
+TEST(ForcingThreads, SameBitsOnOneAndTwoThreads) {
+  auto run = [](int threads) {
+    auto c = std::make_unique<SwCase>();
+    RectangleMeshSpec spec;
+    spec.projection = "UTM-32";
+    spec.x0 = 500000.0, spec.x1 = 502000.0;
+    spec.y0 = 6000000.0, spec.y1 = 6001000.0;
+    spec.nx = 12, spec.ny = 6;
+    spec.layout = CellLayout::kMixed;
+    spec.jitter = 0.2;
+    spec.bed = [](double x, double) { return -2.0 + 3.0 * (x - 500000.0) / 2000.0; };
+    MakeCase(*c, spec, 30.0);
+    SetScheme(c->hd, 1, 2);
+    SetFloodDry(c->hd, 0.005, 0.05, 0.1);
+    HdWindForcing& w = c->hd.forcing.wind;
+    w.type = 1;
+    w.format = 3;
+    InitDataSpec(w.data, 3, {995.0, 15.0, -8.0});
+    w.data.type_of_soft_start = kSoftStartNone;
+    w.soft_time_interval = 200.0;
+    c->hd.forcing.coriolis.type = 2;
+    StartCase(*c, [](double, double) { return 0.0; });
+    OmpSetThreads(threads);
+    RunTo(*c, 300.0);
+    OmpSetThreads(1);
+    return c;
+  };
+  const auto a = run(1), b = run(2);
+  const HdState &sa = a->hd.state, &sb = b->hd.state;
+  int moving = 0;
+  for (int e = 1; e <= sa.nelements; ++e) {
+    ASSERT_EQ(sa.eta[e], sb.eta[e]) << e;
+    ASSERT_EQ(sa.P[e], sb.P[e]) << e;
+    ASSERT_EQ(sa.Q[e], sb.Q[e]) << e;
+    moving += sa.P[e] != 0.0 ? 1 : 0;
+  }
+  EXPECT_GT(moving, 0);
 }
 
 }  // namespace
