@@ -195,6 +195,9 @@ inline void Gradient(const HdForcing& fc, const ElementTable& E, const double* q
   }
 }
 
+// Whether a map value is given (not the file's delete value, a number).
+inline bool MapValueGiven(double x, double del) { return x != del && std::isfinite(x); }
+
 }  // namespace
 
 double WindFrictionHD(const HdWindForcing& w, double speed) {
@@ -241,54 +244,26 @@ void PrepareForcingHD(HdModule& hd, const Mesh& mesh, HdSolver& solver) {
 
 void UPDATEWIND(HdModule& hd, double t) {
   HdWindForcing& w = hd.forcing.wind;
-  HdState& st = hd.state;
-  BoundaryForcingFields& ff = hd.boundary.forcing;
-  const int nown = st.nelements_owned;
+  const int nown = hd.state.nelements_owned;
   const double s = SoftStartFactor(w.type_of_soft_start, w.soft_time_interval, t);
   w.soft = s;
-  const bool turn = !w.north_cos.empty();
-  const double* nc = w.north_cos.data();
-  const double* ns = w.north_sin.data();
-  double* wx = ff.wind_x.data();
-  double* wy = ff.wind_y.data();
   if (w.format != 3) {
     const bool constant = w.format == 0;
     const double speed = s * (constant ? w.constant_speed : FemDataValue(w.data, 1, t));
     const double direction = constant ? w.constant_direction : FemDataValue(w.data, 2, t);
     WindComponentsHD(speed, direction, w.u, w.v);
     w.stress_factor = WindFrictionHD(w, speed) / kWaterOverAirDensity * speed;
-    const double u = w.u, v = w.v, c = w.stress_factor;
-    VHD_OMP_PARALLEL_FOR
-    for (int e = 1; e <= nown; ++e) {
-      const double ca = turn ? nc[e] : 1.0, sa = turn ? ns[e] : 0.0;
-      wx[e] = c * (u * ca + v * sa);
-      wy[e] = c * (v * ca - u * sa);
-    }
     return;
   }
   FemDataRead(w.data, 1, t, w.map_p);
   FemDataRead(w.data, 2, t, w.map_u);
   FemDataRead(w.data, 3, t, w.map_v);
-  const double pn = w.neutral_pressure;
+  w.map_delete = w.data.state.open ? w.data.state.file.delete_value : kZrnDefaultDeleteValue;
+  const double pn = w.neutral_pressure, del = w.map_delete;
   double* p = w.pressure.data();
-  const double *mp = w.map_p.data(), *mu = w.map_u.data(), *mv = w.map_v.data();
-  const HdWindForcing& wc = w;
-  // Where the map holds no value (its delete value, or not a number) the air
-  // is calm at the neutral pressure.
-  const double del = w.data.state.open ? w.data.state.file.delete_value : kZrnDefaultDeleteValue;
-  auto given = [del](double x) { return x != del && std::isfinite(x); };
+  const double* mp = w.map_p.data();
   VHD_OMP_PARALLEL_FOR
-  for (int e = 1; e <= nown; ++e) {
-    const double ca = turn ? nc[e] : 1.0, sa = turn ? ns[e] : 0.0;
-    const bool calm = !given(mu[e]) || !given(mv[e]);
-    const double u = calm ? 0.0 : s * (mu[e] * ca + mv[e] * sa);
-    const double v = calm ? 0.0 : s * (mv[e] * ca - mu[e] * sa);
-    const double speed = std::sqrt(u * u + v * v);
-    const double c = WindFrictionHD(wc, speed) / kWaterOverAirDensity * speed;
-    wx[e] = c * u;
-    wy[e] = c * v;
-    p[e] = given(mp[e]) ? 100.0 * s * mp[e] + (1.0 - s) * pn : pn;
-  }
+  for (int e = 1; e <= nown; ++e) p[e] = MapValueGiven(mp[e], del) ? 100.0 * s * mp[e] + (1.0 - s) * pn : pn;
   // The pressure gradient reads the neighbours' pressure.
   if (hd.subdomain) ExchangeHalo(*hd.subdomain, {&w.pressure});
 }
@@ -311,9 +286,18 @@ void UpdateForcingHD(HdModule& hd, HdSolver& solver, const Mesh& mesh, double t,
   // Wind in thin water: scaled down by h^2 / (2 h_mass)^2 below 2 h_mass.
   const double hc = hd.flood_dry.type > 0 ? hd.flood_dry.mass_depth : 0.0;
   const double thin = hc > 0 ? 1.0 / (4.0 * hc * hc) : 0.0;
+  // Wind stress: one wind for the mesh (formats 0, 1) or the map's per
+  // element (format 3; calm where the map holds no value), turned to the
+  // mesh axes.
+  const HdWindForcing& w = fc.wind;
+  const bool map = wind && w.format == 3;
+  const bool turn = !w.north_cos.empty();
+  const double *nc = w.north_cos.data(), *ns = w.north_sin.data();
+  const double *mu = w.map_u.data(), *mv = w.map_v.data();
+  const double ws = w.soft, wu = w.u, wv = w.v, wc = w.stress_factor, del = w.map_delete;
   const int* code = st.wetdry.data();
   const double *h = st.h.data(), *P = st.P.data(), *Q = st.Q.data();
-  const double *wx = ff.wind_x.data(), *wy = ff.wind_y.data();
+  double *wx = ff.wind_x.data(), *wy = ff.wind_y.data();
   double *px = ff.pressure_x.data(), *py = ff.pressure_y.data();
   const double* p = fc.wind.pressure.data();
   const double* eq = fc.tide.eta_eq.data();
@@ -326,6 +310,21 @@ void UpdateForcingHD(HdModule& hd, HdSolver& solver, const Mesh& mesh, double t,
     const double he = h[e];
     if (pressure) Gradient(fc, E, p, e, px[e], py[e]);
     if (tide) Gradient(fc, E, eq, e, tx[e], ty[e]);
+    if (wind) {
+      const double ca = turn ? nc[e] : 1.0, sa = turn ? ns[e] : 0.0;
+      double tx_w, ty_w;
+      if (map) {
+        const bool calm = !MapValueGiven(mu[e], del) || !MapValueGiven(mv[e], del);
+        const double u = calm ? 0.0 : ws * (mu[e] * ca + mv[e] * sa);
+        const double v = calm ? 0.0 : ws * (mv[e] * ca - mu[e] * sa);
+        const double speed = std::sqrt(u * u + v * v);
+        const double c = WindFrictionHD(w, speed) / kWaterOverAirDensity * speed;
+        tx_w = c * u, ty_w = c * v;
+      } else {
+        tx_w = wc * (wu * ca + wv * sa), ty_w = wc * (wv * ca - wu * sa);
+      }
+      wx[e] = tx_w, wy[e] = ty_w;
+    }
     if (code[e] == kWet) {
       if (wind) {
         const double scale = he < 2.0 * hc ? he * he * thin : 1.0;

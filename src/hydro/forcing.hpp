@@ -72,10 +72,12 @@ struct HdWindForcing {
   // Per element: cos and sin of the angle from the mesh's y axis to true
   // north (clockwise); empty when the mesh axes point east and north.
   Array1<double> north_cos, north_sin;
-  // Last update: soft-start factor; wind (mesh axes) and stress factor c_w W
-  // of formats 0 and 1 (the same for every element).
+  // Last update: soft-start factor; wind (east, north) and stress factor
+  // c_w W of formats 0 and 1 (the same for every element); the delete value
+  // of the map (format 3).
   double soft = 1.0;
   double u = 0.0, v = 0.0, stress_factor = 0.0;
+  double map_delete = 0.0;
 };
 
 struct HdCoriolis {
@@ -157,7 +159,9 @@ void PrepareForcingHD(HdModule& hd, const Mesh& mesh, HdSolver& solver);
 // wind, tide, then the momentum sources of the owned elements.
 void UpdateForcingHD(HdModule& hd, HdSolver& solver, const Mesh& mesh, double t, double dt);
 
-// Wind (UPDATEWIND): soft start, rotation, friction and pressure at time t.
+// Wind (UPDATEWIND) at time t: soft start; one wind and stress factor for
+// formats 0 and 1; the map and the air pressure per owned element for format
+// 3. The stress per element (rotation, friction) is formed with the sources.
 void UPDATEWIND(HdModule& hd, double t);
 // Tide (UPDATETIDE): the equilibrium tide of the owned elements at time t.
 void UPDATETIDE(HdModule& hd, double t);

@@ -48,7 +48,7 @@ TEST(ForcingSetup, DefaultWindOfTenFromTheNorth) {
                   MakeMesh(3, 3, 10.0, 10.0, test::Flat(2.0)), s);
   HdModule& hd = f.hd;
   EXPECT_EQ(hd.forcing.wind.neutral_pressure, 101300.0);
-  UPDATEWIND(hd, 0.0);
+  UpdateForcingHD(hd, s, f.meshes[0], 0.0, 30.0);
   EXPECT_NEAR(hd.forcing.wind.u, 0.0, 1e-14);
   EXPECT_EQ(hd.forcing.wind.v, -10.0);
   const double factor = (0.0016 + 0.001 * 10.0 / 24.0) / 800.0 * 10.0;
@@ -73,7 +73,7 @@ TEST(ForcingSetup, SoftStartGrowsTheWindAndMovesThePressure) {
   hd.state.h.assign(hd.state.nelements, 2.0);
   SetupSolverHD(hd, mesh, s);
   for (double t : {0.0, 250.0, 1000.0, 2000.0}) {
-    UPDATEWIND(hd, t);
+    UpdateForcingHD(hd, s, mesh, t, 30.0);
     const double sf = std::min(1.0, t / 1000.0);
     EXPECT_NEAR(w.pressure[1], 100.0 * (sf * 990.0 + (1.0 - sf) * 1013.0), 1e-9) << t;
     const double W = 5.0 * sf;
@@ -95,7 +95,7 @@ TEST(ForcingSetup, MapWithoutValueIsCalmAtTheNeutralPressure) {
     AllocateStateHD(hd, mesh);
     HdSolver s;
     SetupSolverHD(hd, mesh, s);
-    UPDATEWIND(hd, 100.0);
+    UpdateForcingHD(hd, s, mesh, 100.0, 30.0);
     EXPECT_EQ(w.pressure[2], 101300.0);
     EXPECT_EQ(hd.boundary.forcing.wind_x[2], 0.0);
     EXPECT_EQ(hd.boundary.forcing.wind_y[2], 0.0);
