@@ -9,6 +9,8 @@
 
 #include "hydro/forcing.hpp"
 #include "hydro/sw_fluxes.hpp"
+#include "io/units.hpp"
+#include "io/zrn.hpp"
 #include "mesh/cartography.hpp"
 #include "setup_support.hpp"
 
@@ -55,6 +57,33 @@ TEST(ForcingSetup, DefaultWindOfTenFromTheNorth) {
   EXPECT_NEAR(hd.forcing.wind.stress_factor, factor, 1e-18);
   EXPECT_NEAR(hd.boundary.forcing.wind_y[5], -10.0 * factor, 1e-16);
   EXPECT_NEAR(hd.boundary.forcing.wind_x[5], 0.0, 1e-18);
+}
+
+// Format 1: speed and direction from a point series; the direction from 350
+// to 10 degrees passes through north, so half way the wind blows from the
+// north at the mean speed.
+TEST(ForcingSetup, WindSeriesInterpolatesTheDirectionThroughNorth) {
+  HdSetupFixture f;
+  ZrnFile z;
+  ASSERT_EQ(zrnHeaderCreate(z, f.dir.file("wind.zrn0"), kZrnFileData, "wind"), 0);
+  ASSERT_EQ(zrnSetEqCalendarAxis(z, zrnDateTime(f.time.start), 3600.0), 0);
+  for (int k = 1; k <= 2; ++k) {
+    ASSERT_EQ(zrnSetItemInfo(z, k, k == 1 ? "Speed" : "Direction", kUvqItemUndefined, kUvqUnitUndefined, kZrnDouble),
+              0);
+    ASSERT_EQ(zrnSetItemAxisEqD0(z, k), 0);
+  }
+  ASSERT_EQ(zrnFileCreate(z), 0);
+  const double values[2][2] = {{10.0, 350.0}, {20.0, 10.0}};
+  for (const auto& step : values) {
+    for (double v : step) ASSERT_EQ(zrnWriteItemTimeStep(z, 0.0, &v, 1), 0);
+  }
+  ASSERT_EQ(zrnFileClose(z), 0);
+  HdSolver s;
+  SetupWithSolver(f, kHd + HdSection("WIND_FORCING", "type = 1\nformat = 1\nfile_name = \"wind.zrn0\"\n"),
+                  MakeMesh(3, 3, 10.0, 10.0, test::Flat(2.0)), s);
+  UpdateForcingHD(f.hd, s, f.meshes[0], 1800.0, 30.0);
+  EXPECT_NEAR(f.hd.forcing.wind.u, 0.0, 1e-12);
+  EXPECT_NEAR(f.hd.forcing.wind.v, -15.0, 1e-12);
 }
 
 TEST(ForcingSetup, SoftStartGrowsTheWindAndMovesThePressure) {
