@@ -34,6 +34,7 @@
 #include "core/array1.hpp"
 #include "core/run.hpp"
 #include "hydro/bound.hpp"
+#include "hydro/forcing.hpp"
 #include "io/zrn.hpp"
 #include "log/log.hpp"
 #include "parallel/exact_sum.hpp"
@@ -345,6 +346,7 @@ struct HdModule {
   TimingSet timing;
   HdState state;
   HdBoundary boundary;  // boundary codes and boundary faces
+  HdForcing forcing;    // wind, air pressure, Coriolis, tidal potential
 };
 
 // ---- entry points ----------------------------------------------------------------

@@ -40,7 +40,7 @@ void ReadMeshIndex(std::string_view key, int& index, int nmeshes) {
 
 // Sections of the HD module for features this build does not have. Each is
 // off when every one of its switches is 0; a switch that is absent takes the
-// default given (CORIOLIS is on unless its type says otherwise).
+// default given.
 struct FeatureSwitch {
   const char* key = nullptr;
   int def = 0;
@@ -54,15 +54,12 @@ struct UnavailableFeature {
 
 constexpr UnavailableFeature kUnavailableFeatures[] = {
     {"DEPTH", "A time-varying depth correction", {{"type", 0}}},
-    {"CORIOLIS", "Coriolis forcing", {{"type", 2}}},
-    {"WIND_FORCING", "Wind forcing", {{"type", 0}}},
     {"PRECIPITATION_EVAPORATION", "Precipitation and evaporation",
      {{"type_of_precipitation", 0}, {"type_of_evaporation", 0}}},
     {"INFILTRATION", "Infiltration", {{"type", 0}}},
     {"SOURCES", "Sources and sinks", {{"number_of_sources", 0}}},
     {"RADIATION_STRESS", "Radiation stress", {{"type", 0}}},
     {"ICE", "Ice cover", {{"type", 0}}},
-    {"TIDAL_POTENTIAL", "Tidal potential", {{"type", 0}}},
     {"TEMPERATURE_SALINITY_MODULE", "Temperature and salinity", {{"temperature_mode", 0}, {"salinity_mode", 0}}},
 };
 
@@ -125,7 +122,10 @@ void SetupHD(HdModule& hd, const RunControl& run, const TimeAxis& time, const Mo
   SetupFloodDryHD(hd);
   SetupEddy(hd, mesh);
   SetupBedResistanceHD(hd, mesh);
+  SetupCoriolisHD(hd);
+  SetupWindHD(hd);
   RefuseUnavailableFeaturesHD();
+  SetupTideHD(hd);
   SetupSolutionMethodHD(hd);
   if (hd.mode == 2) SetupInitialConditionsHD(hd);
   SetupBoundCondHD(hd, mesh, hd.boundary);

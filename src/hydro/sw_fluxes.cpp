@@ -1279,6 +1279,7 @@ void SetupSolverHD(HdModule& hd, const Mesh& mesh, HdSolver& s) {
     for (int e = 1; e <= ne; ++e) s.filter_weight[e] = ElementAreaMetres(mesh, e);
   }
   s.thin_water_depth = hd.flood_dry.type > 0 ? 2.0 * hd.flood_dry.drying_depth : 0.0;
+  PrepareForcingHD(hd, mesh, s);
 }
 
 void BoundaryFaceTerms(const HdModule& hd, HdSolver& s, const Mesh& mesh, const BoundaryFaceRecord& rec) {

@@ -170,8 +170,11 @@ void InitialStepHD(HdModule& hd, HdSolver& solver, const Mesh& mesh) {
   HdState& st = hd.state;
   CALCVELOCITYFROMFLUX(st);
   for (int f = 1; f <= st.face_flux_len.size(); ++f) st.face_flux_len[f] = 0.0;
-  // Boundary values at the first time of the run (both values of each pair).
-  UpdateBoundaryValuesHD(hd, mesh, hd.time_axis.TimeOfStep(hd.time_axis.first_step));
+  // Forcings and boundary values at the first time of the run (both values
+  // of each boundary pair).
+  const double t0 = hd.time_axis.TimeOfStep(hd.time_axis.first_step);
+  UpdateForcingHD(hd, solver, mesh, t0, hd.time_step.dt_max_HD);
+  UpdateBoundaryValuesHD(hd, mesh, t0);
   if (hd.eddy.horizontal.type > 0) {
     UpdateGradientsHD(hd, solver, mesh);
     if (hd.subdomain) ExchangeHalo(*hd.subdomain, {&st.ux, &st.uy, &st.vx, &st.vy});
@@ -211,6 +214,8 @@ void StepHD(HdModule& hd, HdSolver& solver, const Mesh& mesh, double t, double d
   const double t_new = t + dt;
 
   start(kHdTimerForcings);
+  // The forcings first: the level tilting of the boundaries reads them.
+  UpdateForcingHD(hd, solver, mesh, t_new, dt);
   UpdateBoundaryValuesHD(hd, mesh, t_new);
   stop(kHdTimerForcings);
 

@@ -213,4 +213,39 @@ for r in "${d}_n1_t1" "${d}_n4_t1"; do
     fail "$r: boundary volume $inflow, expected 30000 m3 within 1 %"
 done
 
+# ---- wind, air pressure and Coriolis over the slope ------------------------------
+
+# The map of wind and air pressure comes from a first run of the slope case
+# on one process: its surface elevation (x 100 Pa), total depth and v
+# velocity at every step, read as pressure (hPa), x and y wind (m/s).
+m=$(case_dir storm_map)
+cp "$d/slope.mesh" "$m/"
+sed -e 's/^number_of_outputs = 3/number_of_outputs = 1/' -e 's/^time_step_frequency = 10/time_step_frequency = 1/' \
+  -e '/^MAXIMUM_CURRENT_SPEED/d' -e '/^U_VELOCITY/d' -e '/^WET_DRY_CODE/d' "$d/setup.toml" > "$m/setup.toml"
+OMP_NUM_THREADS=1 timeout 600 "$VANTORHD" "$m/setup.toml" > "$m/out" 2>&1
+status_is 0 $? "$m"
+s=$(case_dir storm)
+cp "$d/slope.mesh" "$s/"
+cp "$m/area.zrnu" "$s/map.zrnu"
+sed -n '1,/^\[VantorHD.HYDRODYNAMIC_MODULE.BOUNDARY_CONDITIONS.CODE_1\]/p' "$d/setup.toml" | sed '$d' > "$s/setup.toml"
+cat >> "$s/setup.toml" <<'SETUP'
+[VantorHD.HYDRODYNAMIC_MODULE.CORIOLIS]
+type = 2
+
+[VantorHD.HYDRODYNAMIC_MODULE.WIND_FORCING]
+type = 1
+format = 3
+file_name = "map.zrnu"
+item_number_for_pressure = 1
+item_number_for_x_velocity = 2
+item_number_for_y_velocity = 3
+soft_time_interval = 300.0
+
+SETUP
+sed -n '/^\[VantorHD.HYDRODYNAMIC_MODULE.BOUNDARY_CONDITIONS.CODE_1\]/,$p' "$d/setup.toml" >> "$s/setup.toml"
+run_case "$s" 1 1
+run_case "$s" 2 1
+same_results "${s}_n1_t1" "${s}_n2_t1"
+contains "${s}_n1_t1/setup.log" "Section: WIND_FORCING"
+
 finish

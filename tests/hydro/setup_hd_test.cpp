@@ -211,9 +211,6 @@ TEST(SetupHDDeath, FeaturesNotInTheBuildStopTheRunWhenSwitchedOn) {
   struct Case {
     std::string section, keys, message;
   } cases[] = {
-      {"WIND_FORCING", "type = 1\n", "Wind forcing" + na + "type = 1 in VantorHD/HYDRODYNAMIC_MODULE/WIND_FORCING)"},
-      {"CORIOLIS", "latitude = 55.0\n", "Coriolis forcing" + na + "type = 2, the default in"},
-      {"TIDAL_POTENTIAL", "type = 3\n", "Tidal potential" + na + "type = 3"},
       {"PRECIPITATION_EVAPORATION", "type_of_evaporation = 2\n", "evaporation" + na + "type_of_evaporation = 2"},
       {"SOURCES", "number_of_sources = 1\n", "Sources and sinks" + na + "number_of_sources = 1"},
       {"ICE", "type = 2\n", "Ice cover" + na + "type = 2"},
