@@ -34,6 +34,8 @@
 #include "core/array1.hpp"
 #include "core/run.hpp"
 #include "hydro/bound.hpp"
+#include "hydro/forcing_precipitation.hpp"
+#include "hydro/sources.hpp"
 #include "io/zrn.hpp"
 #include "log/log.hpp"
 #include "parallel/exact_sum.hpp"
@@ -345,6 +347,8 @@ struct HdModule {
   TimingSet timing;
   HdState state;
   HdBoundary boundary;  // boundary codes and boundary faces
+  HdPrecipitation precipitation;  // PRECIPITATION_EVAPORATION
+  HdSources sources;              // SOURCES
 };
 
 // ---- entry points ----------------------------------------------------------------

@@ -56,10 +56,7 @@ constexpr UnavailableFeature kUnavailableFeatures[] = {
     {"DEPTH", "A time-varying depth correction", {{"type", 0}}},
     {"CORIOLIS", "Coriolis forcing", {{"type", 2}}},
     {"WIND_FORCING", "Wind forcing", {{"type", 0}}},
-    {"PRECIPITATION_EVAPORATION", "Precipitation and evaporation",
-     {{"type_of_precipitation", 0}, {"type_of_evaporation", 0}}},
     {"INFILTRATION", "Infiltration", {{"type", 0}}},
-    {"SOURCES", "Sources and sinks", {{"number_of_sources", 0}}},
     {"RADIATION_STRESS", "Radiation stress", {{"type", 0}}},
     {"ICE", "Ice cover", {{"type", 0}}},
     {"TIDAL_POTENTIAL", "Tidal potential", {{"type", 0}}},
@@ -126,6 +123,8 @@ void SetupHD(HdModule& hd, const RunControl& run, const TimeAxis& time, const Mo
   SetupEddy(hd, mesh);
   SetupBedResistanceHD(hd, mesh);
   RefuseUnavailableFeaturesHD();
+  SetupPrecipitationHD(hd, mesh);
+  SetupSourcesHD(hd, mesh);
   SetupSolutionMethodHD(hd);
   if (hd.mode == 2) SetupInitialConditionsHD(hd);
   SetupBoundCondHD(hd, mesh, hd.boundary);

@@ -1200,6 +1200,9 @@ void SetupSolverHD(HdModule& hd, const Mesh& mesh, HdSolver& s) {
   for (BoundaryFaceRecord& rec : s.boundary_faces) unit_normal(rec.face, rec.ex, rec.ey, rec.nn);
 
   s.outflow_factor.assign(ne, 1.0);
+  if (hd.precipitation.Active() || hd.sources.Active()) {
+    for (Array1<double>* a : {&s.src_h, &s.src_P, &s.src_Q}) a->assign(ne, 0.0);
+  }
   for (Array1<double>* a : {&s.sum_h, &s.sum_P, &s.sum_Q}) a->assign(ne, 0.0);
   if (second) {
     for (Array1<double>* a : {&s.eta_x, &s.eta_y, &s.P_x, &s.P_y, &s.Q_x, &s.Q_y}) a->assign(ne, 0.0);

@@ -212,6 +212,13 @@ void StepHD(HdModule& hd, HdSolver& solver, const Mesh& mesh, double t, double d
 
   start(kHdTimerForcings);
   UpdateBoundaryValuesHD(hd, mesh, t_new);
+  if (SourcesActive(solver)) {
+    // Sources before precipitation and evaporation, whose limit counts
+    // what the sources bring.
+    ClearElementSources(solver, st.nelements_owned);
+    UpdateSourcesHD(hd, solver, mesh, t_new, dt);
+    UpdatePrecipitationHD(hd, solver, mesh, t_new, dt);
+  }
   stop(kHdTimerForcings);
 
   start(kHdTimerProperties);
