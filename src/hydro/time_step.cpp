@@ -212,7 +212,7 @@ void StepHD(HdModule& hd, HdSolver& solver, const Mesh& mesh, double t, double d
 
   start(kHdTimerForcings);
   UpdateBoundaryValuesHD(hd, mesh, t_new);
-  if (SourcesActive(solver)) {
+  if (hd.sources.Active() || hd.precipitation.Active()) {
     // Sources before precipitation and evaporation, whose limit counts
     // what the sources bring.
     ClearElementSources(solver, st.nelements_owned);

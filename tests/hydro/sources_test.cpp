@@ -199,6 +199,56 @@ TEST(Precipitation, SoftStartAndTimeSeries) {
   }
 }
 
+// A rain field varying in the domain (format 3, a grid of a rate linear in
+// x) gives every element of a dry plain the rate at its centre times t.
+TEST(Precipitation, RainFieldVaryingInTheDomain) {
+  for (const Scheme& s : kSchemes) {
+    SCOPED_TRACE(static_cast<int>(s.layout) * 10 + s.order);
+    SourceCase k;
+    const std::string file = k.dir.file("rain.zrn2");
+    {
+      ZrnFile f;
+      TimeAxis time;
+      ASSERT_EQ(zrnHeaderCreate(f, file, kZrnFileData, "rain field"), 0);
+      ASSERT_EQ(zrnSetEqCalendarAxis(f, zrnDateTime(time.start), 600.0), 0);
+      ASSERT_EQ(zrnSetItemInfo(f, 1, "Rain", kUvqItemUndefined, kUvqUnitUndefined, kZrnDouble), 0);
+      ASSERT_EQ(zrnSetItemAxisEqD2(f, 1, 13, 7, 0.0, 0.0, 50.0, 50.0), 0);
+      ASSERT_EQ(zrnFileCreate(f), 0);
+      std::vector<double> v;
+      for (int j = 0; j < 7; ++j)
+        for (int i = 0; i < 13; ++i) v.push_back(kRain * i * 50.0 / 600.0);
+      for (int step = 0; step < 2; ++step) ASSERT_EQ(zrnWriteItemTimeStep(f, 0.0, v.data(), 91), 0);
+      ASSERT_EQ(zrnFileClose(f), 0);
+    }
+    k.Make(s.layout, s.order, Rain("type_of_precipitation = 1\n", "format = 3\nfile_name = \"" + file + "\"\n"),
+           [](double, double) { return -2.0; }, 10);
+    StartCase(k.c, [](double, double) { return -2.0; });
+    RunTo(k.c, 600.0);
+    for (int e = 1; e <= k.c.hd.state.nelements_owned; ++e)
+      EXPECT_NEAR(k.c.hd.state.h[e], kRainRate * k.c.mesh.elements.xc[e] / 600.0 * 600.0, 1e-14) << e;
+  }
+}
+
+// Rain and sources give the same bits on 1 and 2 threads.
+TEST(Sources, ThreadsAgreeBitwise) {
+  std::vector<double> depths[2];
+  for (int threads : {1, 2}) {
+    SourceCase k;
+    k.Make(CellLayout::kMixed, 2,
+           Rain("type_of_precipitation = 1\ntype_of_evaporation = 1\n",
+                "format = 0\nconstant_value = " + std::to_string(kRain) + "\n", "constant_value = 4800.0\n") +
+               Sources(3) + Source(1, "coordinates = [525.0, 125.0]\nconstant_value = 10.0\n") +
+               Source(2, "type = 3\nconnected_source = 3\ncoordinates = [125.0, 125.0]\nconstant_values = [4.0, 1.0, 0.5]\n") +
+               Source(3, "type = 5\ncoordinates = [175.0, 275.0]\n"));
+    k.Start(0.003);
+    OmpSetThreads(threads);
+    RunTo(k.c, 300.0);
+    OmpSetThreads(1);
+    for (int e = 1; e <= k.c.hd.state.nelements_owned; ++e) depths[threads - 1].push_back(k.c.hd.state.h[e]);
+  }
+  EXPECT_EQ(depths[0], depths[1]);
+}
+
 // Brute-force point-in-element test (convex elements, counter-clockwise or
 // clockwise), independent of the search tree.
 bool Inside(const Mesh& mesh, int e, double x, double y) {
