@@ -43,21 +43,26 @@ void ReadRate(DataSpec& spec, int default_format, const std::string& format_mess
   }
 }
 
+// A field (format 3) is carried onto every element; a constant or a series
+// (formats 0, 1) is one value for the whole domain.
 void OpenRate(HdModule& hd, const Mesh& mesh, DataSpec& spec, Array1<double>& rate) {
   FemDataRequest request;
   request.expect = spec.format == kDataFileMap ? FemDataExpect::kArea : FemDataExpect::kPoint;
   request.location = FemDataLocation::kElements;
   request.mesh = &mesh;
   FemDataOpen(spec, request, hd.time_axis);
-  rate.assign(mesh.elements.nelements, 0.0);
+  if (spec.format == kDataFileMap) rate.assign(mesh.elements.nelements, 0.0);
 }
 
-// Rate (m/s) of every element at time t: the data (mm/day, brought up from
-// 0 by the linear soft start as it is read) converted.
-void ReadRateAt(DataSpec& spec, double t, Array1<double>& rate, int ne) {
+// Rate (m/s) at time t: the data (mm/day, brought up from 0 by the linear
+// soft start as it is read) converted; per element into rate for a field,
+// else the value returned.
+double ReadRateAt(DataSpec& spec, double t, Array1<double>& rate, int ne) {
+  if (spec.format != kDataFileMap) return FemDataValue(spec, 1, t) * kMillimetresPerDay;
   FemDataRead(spec, 1, t, rate);
   VHD_OMP_PARALLEL_FOR
   for (int e = 1; e <= ne; ++e) rate[e] *= kMillimetresPerDay;
+  return 0.0;
 }
 
 }  // namespace
@@ -98,8 +103,7 @@ void SetupPrecipitationHD(HdModule& hd, const Mesh& mesh) {
   if (p.type_of_precipitation > 0) OpenRate(hd, mesh, p.precipitation, p.precipitation_rate);
   if (p.type_of_evaporation == 1) OpenRate(hd, mesh, p.evaporation, p.evaporation_rate);
   if (p.Active()) {
-    p.gain.assign(mesh.elements.nelements, 0.0);
-    p.loss.assign(mesh.elements.nelements, 0.0);
+    for (Array1<double>* a : {&p.gain, &p.loss, &p.gain_total, &p.loss_total}) a->assign(mesh.elements.nelements, 0.0);
   }
 }
 
@@ -110,31 +114,39 @@ void UpdatePrecipitationHD(HdModule& hd, HdSolver& solver, const Mesh& mesh, dou
   const int nown = hd.state.nelements_owned;
   const bool rain = p.type_of_precipitation > 0, net = p.type_of_precipitation == 2;
   const bool evaporation = p.type_of_evaporation == 1;
-  if (rain) ReadRateAt(p.precipitation, t, p.precipitation_rate, ne);
-  if (evaporation) ReadRateAt(p.evaporation, t, p.evaporation_rate, ne);
+  const double p_all = rain ? ReadRateAt(p.precipitation, t, p.precipitation_rate, ne) : 0.0;
+  const double e_all = evaporation ? ReadRateAt(p.evaporation, t, p.evaporation_rate, ne) : 0.0;
   const double* h = hd.state.h.data();
-  const double* pr = rain ? p.precipitation_rate.data() : nullptr;
-  const double* ev = evaporation ? p.evaporation_rate.data() : nullptr;
-  double* gain = p.gain.data();
-  double* loss = p.loss.data();
+  const double* pr = p.precipitation_rate.empty() ? nullptr : p.precipitation_rate.data();
+  const double* ev = p.evaporation_rate.empty() ? nullptr : p.evaporation_rate.data();
+  const double* area = ElementAreasHD(solver, mesh);
+  double *gain = p.gain.data(), *loss = p.loss.data();
+  double *gain_total = p.gain_total.data(), *loss_total = p.loss_total.data();
   double* src_h = solver.src_h.data();
   VHD_OMP_PARALLEL_FOR
   for (int e = 1; e <= nown; ++e) {
     // Rain and evaporation are not negative; a net rate below 0 evaporates.
-    const double r = pr ? pr[e] : 0.0;
+    const double r = pr ? pr[e] : p_all;
     const double in = std::max(r, 0.0);
-    double out = net ? std::max(-r, 0.0) : (ev ? std::max(ev[e], 0.0) : 0.0);
+    double out = net ? std::max(-r, 0.0) : std::max(ev ? ev[e] : e_all, 0.0);
     // No more than the water present and what sources and rain bring in the
     // sub-step.
     out = std::min(out, std::max(0.0, h[e] / dt + src_h[e] + in));
     gain[e] = in;
     loss[e] = out;
     src_h[e] += in - out;
+    gain_total[e] += in * area[e] * dt;
+    loss_total[e] += out * area[e] * dt;
   }
-  const double* area = ElementAreasHD(solver, mesh);
+}
+
+void PrecipitationVolumesHD(const HdPrecipitation& p, int nown, ExactSum& precipitation, ExactSum& evaporation) {
+  precipitation.Clear();
+  evaporation.Clear();
+  if (!p.Active()) return;
   for (int e = 1; e <= nown; ++e) {
-    if (gain[e] != 0.0) p.precipitation_volume += gain[e] * area[e] * dt;
-    if (loss[e] != 0.0) p.evaporation_volume += -loss[e] * area[e] * dt;
+    precipitation += p.gain_total[e];
+    evaporation += -p.loss_total[e];
   }
 }
 

@@ -32,14 +32,16 @@ struct HdPrecipitation {
   int type_of_precipitation = 0;  // 0 none, 1 precipitation, 2 net precipitation
   int type_of_evaporation = 0;    // 0 none, 1 from EVAPORATION
   DataSpec precipitation, evaporation;  // values in mm/day
-  // Per element (m/s): the rate read at the current time, after the soft start.
+  // Per element (m/s), fields (format 3) only: the rate read at the current
+  // time, after the soft start.
   Array1<double> precipitation_rate, evaporation_rate;
   // Per owned element (m/s): what the last sub-step added (gain >= 0) and took
   // (loss >= 0, after the limit to the water present).
   Array1<double> gain, loss;
-  // Volumes over the run (m3, this process's owned elements; evaporation
-  // negative).
-  ExactSum precipitation_volume, evaporation_volume;
+  // Per owned element: the volumes added and taken over the run (m3). Each
+  // element adds its own terms in step order, so the totals, and their exact
+  // sum, do not depend on the threads or processes.
+  Array1<double> gain_total, loss_total;
 
   bool Active() const { return type_of_precipitation > 0 || type_of_evaporation > 0; }
 };
@@ -55,6 +57,10 @@ void SetupPrecipitationHD(HdModule& hd, const Mesh& mesh);
 // length dt), and their depth rates added to solver.src_h of every owned
 // element, after the sources (whose inflow the evaporation limit counts).
 void UpdatePrecipitationHD(HdModule& hd, HdSolver& solver, const Mesh& mesh, double t, double dt);
+
+// Volumes of precipitation and evaporation (negative) over the run, the
+// exact sums over the owned elements 1 .. nown of this process.
+void PrecipitationVolumesHD(const HdPrecipitation& p, int nown, ExactSum& precipitation, ExactSum& evaporation);
 
 void ClosePrecipitationHD(HdPrecipitation& p);
 

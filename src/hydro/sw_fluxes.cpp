@@ -1216,6 +1216,12 @@ void SetupSolverHD(HdModule& hd, const Mesh& mesh, HdSolver& s) {
   s.thin_water_depth = hd.flood_dry.type > 0 ? 2.0 * hd.flood_dry.drying_depth : 0.0;
 }
 
+void ClearElementSources(HdSolver& s, int n) {
+  double *h = s.src_h.data(), *P = s.src_P.data(), *Q = s.src_Q.data();
+  VHD_OMP_PARALLEL_FOR_SIMD
+  for (int e = 1; e <= n; ++e) h[e] = P[e] = Q[e] = 0.0;
+}
+
 void BoundaryFaceTerms(const HdModule& hd, HdSolver& s, const Mesh& mesh, const BoundaryFaceRecord& rec) {
   LandFaceTerms(GatherInput(hd, s, mesh), s, rec);
 }

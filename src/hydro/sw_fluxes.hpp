@@ -192,9 +192,7 @@ inline bool SourcesActive(const HdSolver& s) {
 
 // Zeroes the element source terms of elements 1 .. n before the forcings
 // and sources of a sub-step add theirs.
-inline void ClearElementSources(HdSolver& s, int n) {
-  for (int e = 1; e <= n; ++e) s.src_h[e] = s.src_P[e] = s.src_Q[e] = 0.0;
-}
+void ClearElementSources(HdSolver& s, int n);
 
 // Depth correction k of element e (0 when no depth correction is active).
 inline double DepthCorrection(const HdSolver& s, int e) {

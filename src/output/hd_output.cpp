@@ -346,8 +346,10 @@ VolumeBalance VolumeBalanceHD(const HdOutputs& out, const HdModule& hd, const Me
   b.final_dry = total(dry);
   b.source_inflow = total(hd.sources.inflow);
   b.source_outflow = total(hd.sources.outflow);
-  b.precipitation = total(hd.precipitation.precipitation_volume);
-  b.evaporation = total(hd.precipitation.evaporation_volume);
+  ExactSum precipitation, evaporation;
+  PrecipitationVolumesHD(hd.precipitation, nown, precipitation, evaporation);
+  b.precipitation = total(precipitation);
+  b.evaporation = total(evaporation);
   b.boundaries = total(out.boundaries);
   b.defect = total(defect);
   b.show_sources = hd.mode > 1;
