@@ -12,6 +12,7 @@
 #include "io/setup.hpp"
 #include "io/units.hpp"
 #include "log/log.hpp"
+#include "mesh/cartography.hpp"
 #include "mesh/femdata.hpp"
 #include "mesh/mesh.hpp"
 
@@ -77,6 +78,37 @@ void ReadPosition(HdModule& hd, const Mesh& mesh, SourceRecord& s) {
   }
 }
 
+// The jet parameters of the current section, checked.
+void ReadJet(JetModel& j) {
+  SktReadKeyword("diameter", j.diameter, 0.2);
+  SktReadKeyword("sigma", j.sigma, 0.0);
+  SktReadKeyword("theta", j.theta, 0.0);
+  SktReadKeyword("maximum_distance", j.maximum_distance, 500.0);
+  SktReadKeyword("gamma", j.gamma, 0.01);
+  SktReadKeyword("epsilon", j.epsilon, 0.1);
+  SktReadKeyword("position", j.position, 2);
+  SktReadKeyword("distribution", j.distribution, 2);
+  SktReadKeyword("delta", j.delta, 5.0);
+  SktReadKeyword("entrainment", j.entrainment, 0.07);
+  SktReadKeyword("upstream", j.upstream, 1);
+  SktReadKeyword("distance_upstream", j.distance_upstream, 10.0);
+  SktReadKeyword("number_of_sections_radius", j.number_of_sections_radius, 3);
+  SktReadKeyword("number_of_sections_circle", j.number_of_sections_circle, 12);
+  SktReadKeyword("number_of_sections", j.number_of_sections, 5);
+  const auto positive = [](const char* key, double v) {
+    if (!(v > 0.0)) FatalError("SetupSourcesHD: " + std::string(key) + " = " + Number(v) + " in " + SktSectionPath() + " must be greater than 0");
+  };
+  positive("diameter", j.diameter);
+  positive("maximum_distance", j.maximum_distance);
+  positive("entrainment", j.entrainment);
+  positive("number_of_sections", j.number_of_sections);
+  if (j.gamma < 0.0 || j.epsilon < 0.0 || j.distance_upstream < 0.0 || std::abs(j.theta) > 90.0) {
+    FatalError("SetupSourcesHD: gamma, epsilon and distance_upstream must not be negative and theta lie in -90 "
+               "to 90 degrees in " + SktSectionPath());
+  }
+  j.points.resize(static_cast<std::size_t>(j.number_of_sections));
+}
+
 void ReadSource(HdModule& hd, const Mesh& mesh, SourceRecord& s, int nsources) {
   SktReadKeyword("type", s.type, kSourceSimple);
   if (s.type < kSourceSimple || s.type > kSourceNoData) {
@@ -84,16 +116,15 @@ void ReadSource(HdModule& hd, const Mesh& mesh, SourceRecord& s, int nsources) {
                "; 1 to 5)");
   }
   if (s.type == kSourceJet) {
-    int vertical = 1;
-    SktReadKeyword("interpolation_type", vertical, 1);
-    if (vertical == 1) {
-      FatalError("Type of vertical position must be 2, 3 or 4 (interpolation_type 1 in " + SktSectionPath() +
-                 ")");
+    JetModel& j = s.jet;
+    SktReadKeyword("interpolation_type", j.vertical_position, 1);
+    if (j.vertical_position < 2 || j.vertical_position > 4) {
+      FatalError("Type of vertical position must be 2, 3 or 4 (interpolation_type " +
+                 std::to_string(j.vertical_position) + " in " + SktSectionPath() + ")");
     }
-    FatalError("SetupSourcesHD: Jet sources (the near-field jet model) are not available in this build (type = 4 in " +
-               SktSectionPath() + ")");
   }
   ReadPosition(hd, mesh, s);
+  if (s.type == kSourceJet) ReadJet(s.jet);
   if (s.type == kSourceConnected) {
     SktReadKeyword("connected_source", s.connected_source, 0);
     if (s.connected_source < 1 || s.connected_source > nsources || s.connected_source == s.number) {
@@ -149,6 +180,143 @@ void ReadValues(SourceRecord& s, double t) {
   }
 }
 
+// Direction of true north at (x, y), degrees clockwise from the mesh's y
+// axis (0 where the projection gives none).
+double TrueNorth(const Mesh& mesh, double x, double y) {
+  if (IsGeographic(mesh.projection) || !ProjectionCrsInfo(mesh.projection).known) return 0.0;
+  CTqCartography cart;
+  int status = 0;
+  TqCartCreate(cart, mesh.projection, 0.0, 0.0, 0.0, &status);
+  double angle = 0.0;
+  if (status == 0) TqCartGetTrueNorth(cart, x, y, angle, &status);
+  return status == 0 ? angle : 0.0;
+}
+
+// Gives every process the values of one element per jet: fill(s, v) writes
+// the values v[0 .. 3] of jet s on the process that owns its element, the
+// sum over the processes (0 elsewhere) hands them to all.
+template <class Fill>
+void ShareJetValues(HdModule& hd, Fill&& fill) {
+  HdSources& src = hd.sources;
+  std::fill(src.jet_values.begin(), src.jet_values.end(), 0.0);
+  for (SourceRecord& s : src.sources)
+    if (s.include && s.type == kSourceJet) fill(s, &src.jet_values[4 * static_cast<std::size_t>(s.number - 1)]);
+  if (hd.subdomain && hd.subdomain->Active())
+    SumOverProcesses(src.jet_values.data(), static_cast<int>(src.jet_values.size()), *hd.subdomain);
+}
+
+// The report of jet s at time t; end: its end element, -1 on land, -2
+// outside the mesh; upstream: its upstream point 0 in water, 1 on land, 2
+// outside the mesh.
+void ReportJet(const Mesh& mesh, const SourceRecord& s, double t, int end, int upstream) {
+  const JetModel& j = s.jet;
+  const double scale = IsGeographic(mesh.projection) ? 1.0 / kDegToRad : 1.0;
+  const std::string number = std::to_string(s.number);
+  if (upstream != 0) {
+    Warning(SubstituteValue("Time % (s). ", t) +
+            SubstituteValue(upstream == 1 ? "Upstream ambient point of jet % on land"
+                                          : "Upstream ambient point of jet % outside domain",
+                            number));
+  }
+  if (end < 0) {
+    Warning(SubstituteValue("Time % (s). ", t) +
+            SubstituteValue(end == -1 ? "Position of jet % on land" : "Position of jet % outside domain", number));
+  }
+  WriteLogLine("");
+  WriteLogLine("Source information");
+  WriteValueLine("Source number            : %", s.number);
+  WriteValueLine("Time                     : %", t);
+  WriteValueLine("Receiving element        : %", mesh.elements.id[j.end_element]);
+  for (std::size_t k = 0; k < j.points.size(); ++k) {
+    const JetPoint& p = j.points[k];
+    WriteValueLine("Point %", static_cast<int>(k + 1));
+    WriteValueLine("  x end position          : %", p.x * scale);
+    WriteValueLine("  y end position          : %", p.y * scale);
+    WriteValueLine("  z end position          : %", p.z);
+    WriteValueLine("  Discharge               : %", p.discharge);
+    WriteValueLine("  Characteristic width    : %", p.width);
+    WriteValueLine("  Dilution factor         : %", p.dilution);
+    WriteValueLine("  Distance                : %", p.distance);
+    WriteValueLine("  Stop code               : %", p.stop);
+    WriteValueLine("  x end upstream position : %", j.x_upstream * scale);
+    WriteValueLine("  y end upstream position : %", j.y_upstream * scale);
+    WriteValueLine("  upstream distance       : %", j.distance_to_upstream);
+  }
+}
+
+// The near field of every jet with a discharge: the current at the source,
+// the ambient current upstream, the model, and the element where the jet
+// ends (the source's own when the end lies on land or outside the mesh).
+void UpdateJets(HdModule& hd, const Mesh& mesh, double t) {
+  HdSources& src = hd.sources;
+  const HdState& st = hd.state;
+  const int nown = st.nelements_owned;
+  const auto owned = [nown](int e) { return e >= 1 && e <= nown; };
+  const bool geographic = IsGeographic(mesh.projection);
+  const auto active = [](const SourceRecord& s) { return s.include && s.type == kSourceJet && s.values_new[0] > 0; };
+  ShareJetValues(hd, [&](SourceRecord& s, double* v) {
+    if (!active(s) || !owned(s.element)) return;
+    v[0] = st.u[s.element], v[1] = st.v[s.element], v[2] = -st.d[s.element], v[3] = st.eta[s.element];
+  });
+  for (SourceRecord& s : src.sources) {
+    if (!active(s)) continue;
+    JetModel& j = s.jet;
+    const double* v = &src.jet_values[4 * static_cast<std::size_t>(s.number - 1)];
+    j.u_source = v[0], j.v_source = v[1], j.z_bed = v[2], j.z_surface = v[3];
+    const double speed = std::hypot(j.u_source, j.v_source);
+    const double mx = geographic ? hd.metric_radius * std::cos(s.y) : 1.0;
+    const double my = geographic ? hd.metric_radius : 1.0;
+    j.distance_to_upstream = speed > 0 ? j.distance_upstream : 0.0;
+    j.x_upstream = s.x - (speed > 0 ? j.distance_upstream * j.u_source / speed / mx : 0.0);
+    j.y_upstream = s.y - (speed > 0 ? j.distance_upstream * j.v_source / speed / my : 0.0);
+    j.upstream_element = FindElementID2DSearchTree(j.x_upstream, j.y_upstream, mesh, src.tree);
+  }
+  ShareJetValues(hd, [&](SourceRecord& s, double* v) {
+    const int e = s.jet.upstream_element;
+    if (!active(s) || !owned(e)) return;
+    v[0] = st.u[e], v[1] = st.v[e], v[2] = st.wetdry[e] == kWet ? 1.0 : 0.0;
+  });
+  std::vector<int>& keys = src.jet_keys;
+  for (SourceRecord& s : src.sources) {
+    if (!active(s)) continue;
+    JetModel& j = s.jet;
+    const double* v = &src.jet_values[4 * static_cast<std::size_t>(s.number - 1)];
+    // Outside the mesh the current at the source serves; on land there is none.
+    double ua = j.u_source, va = j.v_source;
+    int upstream = 0;
+    if (j.upstream_element == 0) {
+      upstream = 2;
+    } else if (v[2] == 0.0) {
+      upstream = 1, ua = va = 0.0;
+    } else {
+      ua = v[0], va = v[1];
+    }
+    const double mx = geographic ? hd.metric_radius * std::cos(s.y) : 1.0;
+    const double my = geographic ? hd.metric_radius : 1.0;
+    RunJetModel(s, ua, va, j.z_bed, j.z_surface, mx, my);
+    j.end_element = FindElementID2DSearchTree(j.points.back().x, j.points.back().y, mesh, src.tree);
+    keys[static_cast<std::size_t>(s.number - 1)] = upstream;
+  }
+  ShareJetValues(hd, [&](SourceRecord& s, double* v) {
+    if (active(s) && owned(s.jet.end_element)) v[0] = st.wetdry[s.jet.end_element] == kWet ? 1.0 : 0.0;
+  });
+  for (SourceRecord& s : src.sources) {
+    if (!active(s)) continue;
+    JetModel& j = s.jet;
+    const bool wet = src.jet_values[4 * static_cast<std::size_t>(s.number - 1)] != 0.0;
+    const int end = j.end_element == 0 ? -2 : wet ? j.end_element : -1;
+    if (end < 0) {
+      // The water goes in at the source.
+      j.end_element = s.element;
+      j.release_u = j.u_source, j.release_v = j.v_source;
+    }
+    const int upstream = keys[static_cast<std::size_t>(s.number - 1)];
+    const int key = 4 * end + upstream;
+    if (key != j.report_key) ReportJet(mesh, s, t, end, upstream);
+    j.report_key = key;
+  }
+}
+
 }  // namespace
 
 void SetupSourcesHD(HdModule& hd, const Mesh& mesh) {
@@ -193,11 +361,18 @@ void SetupSourcesHD(HdModule& hd, const Mesh& mesh) {
   for (SourceRecord& s : src.sources) {
     if (!s.include) continue;
     Locate(src, mesh, s, -1.0);
+    if (s.type == kSourceJet) {
+      s.jet.north = TrueNorth(mesh, s.x, s.y);
+      s.jet.end_element = s.element;
+      src.has_jets = true;
+    }
     OpenData(hd, mesh, s);
     ReadValues(s, 0.0);
     s.discharge = s.type == kSourceNoData ? 0.0 : s.values_new[0];
   }
   src.withdrawn.assign(src.sources.size(), 0.0);
+  src.jet_values.assign(4 * src.sources.size(), 0.0);
+  src.jet_keys.assign(src.sources.size(), 0);
   src.element_rate.assign(mesh.elements.nelements, 0.0);
 }
 
@@ -222,6 +397,13 @@ void UpdateSourcesHD(HdModule& hd, HdSolver& solver, const Mesh& mesh, double t,
     }
     ReadValues(s, t);
   }
+  if (src.has_jets) {
+    for (const SourceRecord& s : src.sources)
+      if (s.include && s.type == kSourceJet) src.element_rate[s.jet.end_element] = 0.0;
+    UpdateJets(hd, mesh, t);
+    for (const SourceRecord& s : src.sources)
+      if (s.include && s.type == kSourceJet) src.element_rate[s.jet.end_element] = 0.0;
+  }
   // The element giving water for a source's discharge q, and the one
   // receiving it (0: none).
   const auto sides = [&](const SourceRecord& s, double q, int& giver, int& taker) {
@@ -233,7 +415,7 @@ void UpdateSourcesHD(HdModule& hd, HdSolver& solver, const Mesh& mesh, double t,
     } else if (q < 0) {
       giver = s.element;
     } else {
-      taker = s.element;
+      taker = s.type == kSourceJet ? s.jet.end_element : s.element;
     }
   };
   // Withdrawals first, each limited by the water its element holds then.
@@ -270,8 +452,9 @@ void UpdateSourcesHD(HdModule& hd, HdSolver& solver, const Mesh& mesh, double t,
     if (!owned(taker) || released == 0.0) continue;
     solver.src_h[taker] += released / area[taker];
     if (st.wetdry[taker] == kWet && s.type != kSourceSimple) {
-      solver.src_P[taker] += released * s.values_new[1] / area[taker];
-      solver.src_Q[taker] += released * s.values_new[2] / area[taker];
+      const bool jet = s.type == kSourceJet;
+      solver.src_P[taker] += released * (jet ? s.jet.release_u : s.values_new[1]) / area[taker];
+      solver.src_Q[taker] += released * (jet ? s.jet.release_v : s.values_new[2]) / area[taker];
     }
     src.element_rate[taker] += released;
     src.inflow += released * dt;

@@ -7,6 +7,7 @@
 #include <gtest/gtest.h>
 
 #include <cmath>
+#include <numbers>
 #include <string>
 #include <vector>
 
@@ -63,6 +64,7 @@ struct SourceCase {
       if (inside(c.mesh.elements.xc[e])) v += c.hd.state.h[e] * c.mesh.elements.area[e];
     return v;
   }
+  std::string Log() const { return JoinedLog(log_path); }
   double MinDepth() const {
     double m = 1e300;
     for (int e = 1; e <= c.hd.state.nelements_owned; ++e) m = std::min(m, c.hd.state.h[e]);
@@ -463,7 +465,9 @@ TEST(SourcesDeath, SetupMessages) {
   } cases[] = {
       {Sources(1) + Source(1, "type = 6\n" + at), "Type not supported for sources (type 6 in"},
       {Sources(1) + Source(1, "type = 4\ninterpolation_type = 1\n" + at), "Type of vertical position must be 2, 3 or 4"},
-      {Sources(1) + Source(1, "type = 4\ninterpolation_type = 2\n" + at), "Jet sources (the near-field jet model)"},
+      {Sources(1) + Source(1, "type = 4\ninterpolation_type = 2\ndiameter = 0.0\n" + at),
+       "diameter = 0 in VantorHD/HYDRODYNAMIC_MODULE/SOURCES/SOURCE_1 must be greater than 0"},
+      {Sources(1) + Source(1, "type = 4\ninterpolation_type = 2\ntheta = 95.0\n" + at), "theta lie in -90 to 90"},
       {Sources(2) + Source(1, "type = 3\nconnected_source = 3\n" + at) + Source(2, "type = 5\n" + at),
        "Illegal source number (connected_source 3"},
       {Sources(2) + Source(1, "type = 3\nconnected_source = 1\n" + at) + Source(2, "type = 5\n" + at),
@@ -496,6 +500,108 @@ TEST(SourcesDeath, SetupMessages) {
     SCOPED_TRACE(c.message);
     SourceCase k;
     ExpectStop([&] { k.Make(CellLayout::kQuadrilaterals, 1, c.text); }, k.log_path, c.message);
+  }
+}
+
+// The near-field jet in still water: the momentum flux stays Q w0, the
+// discharge grows linearly, dilution 1 + 4 alpha s / D at every section end
+// (0.28 s / D far out), straight along sigma at mid-depth.
+TEST(Jets, StillWaterDilutionOfARoundJet) {
+  SourceRecord s;
+  s.type = kSourceJet;
+  s.x = 100.0, s.y = 200.0;
+  s.values_new[0] = 0.5;
+  JetModel& j = s.jet;
+  j.diameter = 0.3, j.sigma = 30.0, j.maximum_distance = 60.0, j.entrainment = 0.07, j.number_of_sections = 4;
+  j.points.resize(4);
+  RunJetModel(s, 0.0, 0.0, -10.0, 0.0, 1.0, 1.0);
+  for (int k = 0; k < 4; ++k) {
+    const JetPoint& p = j.points[static_cast<std::size_t>(k)];
+    const double dist = 15.0 * (k + 1);
+    EXPECT_NEAR(p.distance, dist, 1e-12);
+    EXPECT_NEAR(p.dilution, 1.0 + 4.0 * 0.07 * dist / 0.3, 1e-10);
+    EXPECT_NEAR(p.discharge, 0.5 * p.dilution, 1e-10);
+    EXPECT_NEAR(p.x, 100.0 + dist * std::sin(30.0 * kDegToRad), 1e-9);
+    EXPECT_NEAR(p.y, 200.0 + dist * std::cos(30.0 * kDegToRad), 1e-9);
+    EXPECT_NEAR(p.z, -5.0, 1e-12);
+    // Momentum flux Q w of the top-hat jet: the width follows from it.
+    const double w0 = 0.5 / (0.25 * std::numbers::pi * 0.09);
+    const double w = 0.5 * w0 / p.discharge;
+    EXPECT_NEAR(p.width, 2.0 * std::sqrt(p.discharge / (std::numbers::pi * w)), 1e-12);
+    EXPECT_EQ(p.stop, kJetStopDistance);
+  }
+  // The jet's own water leaves with its momentum flux: Q0 u = Q w (excess).
+  EXPECT_NEAR(std::hypot(j.release_u, j.release_v), 0.5 / (0.25 * std::numbers::pi * 0.09), 1e-9);
+}
+
+// In a cross current the jet bends with it, entrains more than in still
+// water, and stops where its excess velocity falls below epsilon times the
+// ambient speed; a jet rising at theta meets the surface.
+TEST(Jets, CrossCurrentBendsAndStopsTheJet) {
+  SourceRecord s;
+  s.type = kSourceJet;
+  s.values_new[0] = 0.2;
+  JetModel& j = s.jet;
+  j.diameter = 0.2, j.sigma = 0.0, j.maximum_distance = 500.0, j.number_of_sections = 5;
+  j.points.resize(5);
+  RunJetModel(s, 0.5, 0.0, -20.0, 0.0, 1.0, 1.0);
+  const JetPoint& end = j.points.back();
+  EXPECT_EQ(end.stop, kJetStopAmbient);
+  EXPECT_LT(end.distance, 500.0);
+  EXPECT_GT(end.x, end.y);  // carried east more than it went north
+  EXPECT_GT(end.dilution, 10.0);
+  // Momentum: the entrained water brings u_a, so Q (w - u_a) keeps its start
+  // value and the water released carries exactly the jet's momentum flux,
+  // Q0 w0 northwards.
+  const double w0 = 0.2 / (0.25 * std::numbers::pi * 0.04);
+  EXPECT_NEAR(j.release_u, 0.0, 1e-9 * w0);
+  EXPECT_NEAR(j.release_v, w0, 1e-9 * w0);
+
+  j.theta = 45.0;
+  RunJetModel(s, 0.0, 0.0, -20.0, 0.0, 1.0, 1.0);
+  EXPECT_EQ(j.points.back().stop, kJetStopSurface);
+  EXPECT_NEAR(j.points.back().z, 0.0, 1e-12);
+  // Within one step (1 m) of the path to the surface, 10 m above mid-depth.
+  EXPECT_NEAR(j.points.back().distance, 10.0 * std::sqrt(2.0), 1.0);
+}
+
+// A jet in a basin: its water enters where the jet ends, the volume grows by
+// Q t, and the log reports the near field; a jet aimed at the dry plateau
+// warns and puts its water in at the source.
+TEST(Jets, JetReleasesAtItsEndAndReportsInTheLog) {
+  struct Case {
+    double x, sigma, distance;
+    const char* warning;  // empty: the jet ends in water
+  } cases[] = {{25.0, 90.0, 150.0, ""},
+               {125.0, 90.0, 400.0, "Position of jet 1 on land"},
+               {125.0, 0.0, 400.0, "Position of jet 1 outside domain"}};
+  for (const Case& cs : cases) {
+    SCOPED_TRACE(cs.warning);
+    SourceCase k;
+    k.Make(CellLayout::kMixed, 2,
+           Sources(1) + Source(1, "type = 4\ninterpolation_type = 2\ncoordinates = [" + std::to_string(cs.x) +
+                                      ", 125.0]\nsigma = " + std::to_string(cs.sigma) +
+                                      "\nmaximum_distance = " + std::to_string(cs.distance) +
+                                      "\ndiameter = 0.5\nconstant_values = [2.0, 0.0, 0.0]\n"));
+    k.Start();
+    const double v0 = Volume(k.c);
+    RunTo(k.c, 120.0);
+    const SourceRecord& s = k.c.hd.sources.sources[0];
+    const JetPoint& end = s.jet.points.back();
+    EXPECT_NEAR(Volume(k.c) - v0, 240.0, 1e-12 * v0);
+    const std::string log = k.Log();
+    EXPECT_NE(log.find("Source information"), std::string::npos);
+    EXPECT_NE(log.find("Point 5"), std::string::npos);
+    EXPECT_NE(log.find("Dilution factor"), std::string::npos);
+    EXPECT_NE(log.find("upstream distance"), std::string::npos);
+    if (*cs.warning) {
+      EXPECT_NE(log.find(cs.warning), std::string::npos) << log;
+      EXPECT_EQ(s.jet.end_element, s.element);
+    } else {
+      EXPECT_EQ(log.find("Position of jet"), std::string::npos) << log;
+      EXPECT_EQ(s.jet.end_element, ElementAt(k.c.mesh, end.x, end.y));
+      EXPECT_NE(s.jet.end_element, s.element);
+    }
   }
 }
 
