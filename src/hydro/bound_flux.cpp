@@ -85,24 +85,37 @@ RiemannFlux DirectFlux(double hb, double unb, double utb, double d, double k, do
   return F;
 }
 
-// Face slots of the inner element. bedslope is g X d len with the face d of
-// the flux (F.d), so that pressure and bed slope cancel for water at rest.
-// theta (0..1] multiplies the flux when the outflow of the inner element is
-// limited.
-void WriteFace(HdState& st, HdSolver& s, int f, RiemannFlux F, bool wet, double bedslope, double nx, double ny,
-               double theta) {
+// Face slots of the inner element, whose surface plus depth correction at
+// the centre is X: the bed-slope term g X d len with the face d of the flux
+// (F.d), so that pressure and bed slope cancel for water at rest. theta
+// (0..1] multiplies the flux when the outflow of the inner element is
+// limited: the mass flux, and of the momentum terms only their part beyond
+// the hydrostatic one -g/2 X^2 n len, as at interior faces. The pressure in
+// the flux, g/2 (h^2 - d^2), carries g X d against the unscaled bed-slope
+// term; scaled with the flux it pushed the draining water by g X d
+// (1 - theta): thin water leaving through a transmissive or weakly reflecting
+// boundary left 15 % of its volume in 40 s at the datum, 35 % at 30 m below
+// it and 57 % at 30 m above it.
+void WriteFace(HdState& st, HdSolver& s, int f, RiemannFlux F, bool wet, double X, double nx, double ny,
+               double len, double theta) {
+  const double g = kPhysical.g;
   if (theta < 1.0) {
     F.Fh *= theta;
     F.mass *= theta;
-    F.momx *= theta;
-    F.momy *= theta;
   }
   st.face_flux_len[f] = F.mass;
-  if (wet) {
-    SetBoundaryFaceTerms(s, f, -F.momx + bedslope * nx, -F.momy + bedslope * ny);
-  } else {
+  if (!wet) {
     SetBoundaryFaceTerms(s, f, 0.0, 0.0);
+    return;
   }
+  const double bedslope = g * X * F.d * len;
+  double mx = -F.momx + bedslope * nx, my = -F.momy + bedslope * ny;
+  if (theta < 1.0) {
+    const double hydrostatic = -0.5 * g * X * X * len;
+    mx = hydrostatic * nx + theta * (mx - hydrostatic * nx);
+    my = hydrostatic * ny + theta * (my - hydrostatic * ny);
+  }
+  SetBoundaryFaceTerms(s, f, mx, my);
 }
 
 void ZeroFace(HdState& st, HdSolver& s, int f) {
@@ -148,7 +161,7 @@ void CyclicFace(HdModule& hd, HdSolver& s, const Mesh& mesh, const BoundaryFaceR
   const HdSolutionTechnique& sol = hd.solution;
   const RiemannFlux F =
       RiemannFaceFlux(L, R, nx, ny, h_min, sol.type_of_Riemann_solver, sol.type_of_entropy_fix, len, g);
-  WriteFace(st, s, f, F, cc == kWet, g * (st.eta[c] + kc) * F.d * len, nx, ny, theta);
+  WriteFace(st, s, f, F, cc == kWet, st.eta[c] + kc, nx, ny, len, theta);
 }
 
 }  // namespace
@@ -297,7 +310,7 @@ void BoundaryFaceFluxHD(HdModule& hd, HdSolver& s, const Mesh& mesh, const Bound
       F.mass = F.Fh * len;
     }
   }
-  WriteFace(st, s, f, F, wet, g * (st.eta[c] + k) * F.d * len, nx, ny, theta);
+  WriteFace(st, s, f, F, wet, st.eta[c] + k, nx, ny, len, theta);
 }
 
 }  // namespace vhd

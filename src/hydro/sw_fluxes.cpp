@@ -135,6 +135,18 @@ inline void WallTerms(const FaceLoopInput& in, int e, const SideValues& side, do
   my = -(pw * oy - Dy) + b * oy;
 }
 
+// The side with which wet element e meets a dry neighbour as a wall: its face
+// values, or its centre values where the face values are deeper. A dry
+// neighbour lower than the element puts the face bed (the mean of the two
+// beds) below the element's own, and the face depth over it exceeds the
+// water the element holds: a film of 0.3 mm took 5 mm there, with it its
+// velocity into the wall, and the two-shock wall depth of that (0.17 m)
+// threw it back and forth at up to 8 g (Thacker bowl, 0.04 m elements).
+inline SideValues WallSide(const FaceLoopInput& in, int e, const SideValues& face) {
+  if (face.h <= in.h[e]) return face;
+  return {in.eta[e], in.P[e], in.Q[e], in.d[e], in.h[e]};
+}
+
 // Terms of a land boundary face of wet element e (its element1).
 void LandFaceTerms(const FaceLoopInput& in, HdSolver& s, const BoundaryFaceRecord& rec) {
   const int f = rec.face, e = rec.element;
@@ -233,11 +245,45 @@ void ZeroFace(HdSolver& s, int f) { SetFaceTerms(s, f, 0.0, 0.0, 0.0, 0.0); }
 // order (with face_limit_dry), from the centre depths of its sides.
 inline double FallBackDepth(const FaceLoopInput& in, double hL, double hR) { return 0.05 * (in.h_min + hL + hR); }
 
-// Whether a second-order face between sides of centre depths hL, hR falls
-// back to first order.
-inline bool FallsBackToFirstOrder(const FaceLoopInput& in, double hL, double hR) {
+// Whether the centre velocities of the sides L, R of interior face i (unit
+// normal from L to R) run together faster than twice the celerity of the
+// thinner side: a bore or hydraulic jump stands at the face. Reconstructed
+// there, the thin side took the surface of the deep side at the face (the
+// clip allows anything between the two centres) with its own P: its water
+// left as a deep, slow face state, carrying its mass without its momentum,
+// and the thin element sped up as it drained. Jets running into the pond
+// at the foot of a 20 % slope reached 1.3 times the energy bound
+// 2 sqrt(g h0) + sqrt(2 g dz) that way, with every solver.
+// (Written without divisions: closing speed times hL hR.)
+inline bool BoreAtFace(const FaceLoopInput& in, int i, int L, int R) {
+  const double hL = in.h[L], hR = in.h[R];
+  const double ex = in.ex[i], ey = in.ey[i];
+  const double closing = (in.P[L] * ex + in.Q[L] * ey) * hR - (in.P[R] * ex + in.Q[R] * ey) * hL;
+  const double hh = hL * hR;
+  return hh > 0 && closing > 0 && closing * closing > 4.0 * in.g * std::min(hL, hR) * hh * hh;
+}
+
+// Whether second-order face i between L and R falls back to first order:
+// next to a nearly dry side (centre depth below FallBackDepth), or at a bore
+// (BoreAtFace).
+inline bool FallsBackToFirstOrder(const FaceLoopInput& in, int i, int L, int R) {
+  if (!in.face_limit_dry) return false;
+  const double hL = in.h[L], hR = in.h[R];
   const double limit = FallBackDepth(in, hL, hR);
-  return in.face_limit_dry && (limit > hL || limit > hR);
+  return limit > hL || limit > hR || BoreAtFace(in, i, L, R);
+}
+
+// Whether the reconstruction leaves a side of a second-order face (face
+// depths hl, hr) without depth there: below the fall-back depth limit of its
+// centre depths. The face then falls back to first order too. A film on a
+// slope has its surface reconstructed along the bed; where that surface
+// meets the face bed (the mean of two beds, below the film's own), the face
+// depth is zero while the film's centre surface stands above the face bed by
+// the bed step, and the pressure against the bed-slope term pushed the film
+// with g/2 (eta_f - eta)^2 instead of g h (eta_f - eta): films of 0.2 mm in
+// the Thacker bowl were driven at 3 g towards 60 m/s.
+inline bool DrainedAtFace(const FaceLoopInput& in, double limit, double hl, double hr) {
+  return in.face_limit_dry && (limit > hl || limit > hr);
 }
 
 // Depth by which the surface of a side (face depth h over face d) lies below
@@ -275,35 +321,47 @@ inline void FieldFaceValues(double ca, double cb, double da, double dc, bool cli
 // Face values of the two sides of interior face f (l, r hold the centre
 // values on entry): with second order the reconstructed values, clipped and
 // sign-kept as the settings ask; then the face d and face depth of each side.
-// Returns true when a second-order face fell back to first order next to a
-// nearly dry side (always true with first order).
+// Returns true when a second-order face fell back to first order
+// (FallsBackToFirstOrder, or a side drained at the face by the reconstruction:
+// DrainedAtFace), always true with first order.
 template <bool kSecond>
-[[gnu::always_inline]] inline bool FaceSideValues(const FaceLoopInput& in, int f, int L, int R, SideValues& l, SideValues& r) {
+[[gnu::always_inline]] inline bool FaceSideValues(const FaceLoopInput& in, int f, int i, int L, int R, SideValues& l,
+                                                  SideValues& r) {
   const double etaL = l.eta, etaR = r.eta;  // centre values
   const double hL = l.h, hR = r.h;
   bool first = !kSecond;
   if constexpr (kSecond) {
-    first = FallsBackToFirstOrder(in, hL, hR);
+    first = FallsBackToFirstOrder(in, i, L, R);
     const double limit = FallBackDepth(in, hL, hR);
-    if (first && in.fad != 0 && (limit > hL) != (limit > hR)) VelocityAtFaceDepth(limit > hL ? r : l, in.face_d[f]);
     if (!first) {
       const double xf = in.xf[f], yf = in.yf[f];
       const double ax = xf - in.xc[L], ay = yf - in.yc[L], bx = xf - in.xc[R], by = yf - in.yc[R];
       const bool clip = in.face_value_limiter > 0, keep = in.preserve_dU;
+      SideValues a = l, b = r;
       FieldFaceValues(etaL, etaR, in.eta_x[L] * ax + in.eta_y[L] * ay, in.eta_x[R] * bx + in.eta_y[R] * by, clip,
-                      keep, l.eta, r.eta);
-      FieldFaceValues(l.P, r.P, in.P_x[L] * ax + in.P_y[L] * ay, in.P_x[R] * bx + in.P_y[R] * by, clip, keep, l.P,
-                      r.P);
-      FieldFaceValues(l.Q, r.Q, in.Q_x[L] * ax + in.Q_y[L] * ay, in.Q_x[R] * bx + in.Q_y[R] * by, clip, keep, l.Q,
-                      r.Q);
+                      keep, a.eta, b.eta);
+      FieldFaceValues(l.P, r.P, in.P_x[L] * ax + in.P_y[L] * ay, in.P_x[R] * bx + in.P_y[R] * by, clip, keep, a.P,
+                      b.P);
+      FieldFaceValues(l.Q, r.Q, in.Q_x[L] * ax + in.Q_y[L] * ay, in.Q_x[R] * bx + in.Q_y[R] * by, clip, keep, a.Q,
+                      b.Q);
+      if (in.fad != 0) {
+        FaceDepth(a, in.face_d[f]);
+        FaceDepth(b, in.face_d[f]);
+      }
+      if (!DrainedAtFace(in, limit, a.h, b.h)) {
+        l = a, r = b;
+        return false;
+      }
+      first = true;
     }
+    if (in.fad != 0 && (limit > hL) != (limit > hR)) VelocityAtFaceDepth(limit > hL ? r : l, in.face_d[f]);
   }
   // Face d and face depths from d_f, except with face_average_d 0 and at the
   // faces of a second-order run that fell back to first order, where each
   // side keeps its centre d and h. The type-4 solver keeps d_f at those faces
   // too: its contact speed u* = (u_L + u_R)/2 + c_L - c_R would move water at
   // rest whose two sides see different depths.
-  if (in.fad != 0 && (!first || !kSecond || in.solver == 4)) {
+  if (in.fad != 0 && (!kSecond || in.solver == 4)) {
     const double df = in.face_d[f];
     FaceDepth(l, df);
     FaceDepth(r, df);
@@ -427,14 +485,14 @@ void InteriorFaceTerms(const FaceLoopInput& in, HdSolver& s, double* face_flux_l
     return;
   }
 
-  // Land treatment of the wet side.
+  // Land treatment of the wet side, with at most its centre depth.
   face_flux_len[f] = 0.0;
   double mx, my;
   if (cL == kWet) {
-    WallTerms(in, L, l, ex, ey, nn, nlen, mx, my);
+    WallTerms(in, L, WallSide(in, L, l), ex, ey, nn, nlen, mx, my);
     SetFaceTerms(s, f, mx, my, 0.0, 0.0);
   } else {
-    WallTerms(in, R, r, -ex, -ey, nn, nlen, mx, my);
+    WallTerms(in, R, WallSide(in, R, r), -ex, -ey, nn, nlen, mx, my);
     SetFaceTerms(s, f, 0.0, 0.0, mx, my);
   }
 }
@@ -443,7 +501,7 @@ void InteriorFaceTerms(const FaceLoopInput& in, HdSolver& s, double* face_flux_l
 // order (FaceSideValues); false for a face without a wet side, whose terms
 // are set to zero before any arithmetic.
 template <bool kSecond>
-[[gnu::always_inline]] inline bool WetFaceValues(const FaceLoopInput& in, HdSolver& s, double* face_flux_len, int f,
+[[gnu::always_inline]] inline bool WetFaceValues(const FaceLoopInput& in, HdSolver& s, double* face_flux_len, int f, int i,
                           SideValues& l, SideValues& r, bool& first) {
   const int L = in.e1[f], R = in.e2[f];
   if (in.code[L] != kWet && in.code[R] != kWet) {  // dry-dry (or flooded) faces carry nothing
@@ -453,7 +511,7 @@ template <bool kSecond>
   }
   l = {in.eta[L], in.P[L], in.Q[L], in.d[L], in.h[L]};
   r = {in.eta[R], in.P[R], in.Q[R], in.d[R], in.h[R]};
-  first = FaceSideValues<kSecond>(in, f, L, R, l, r);
+  first = FaceSideValues<kSecond>(in, f, i, L, R, l, r);
   return true;
 }
 
@@ -465,7 +523,7 @@ inline void InteriorFace(const FaceLoopInput& in, HdSolver& s, double* face_flux
   const int f = s.interior_faces[i];
   SideValues l, r;
   bool first;
-  if (!WetFaceValues<kSecond>(in, s, face_flux_len, f, l, r, first)) return;
+  if (!WetFaceValues<kSecond>(in, s, face_flux_len, f, i, l, r, first)) return;
   InteriorFaceTerms<kSecond>(in, s, face_flux_len, f, i, l, r, first, theta);
 }
 
@@ -537,7 +595,7 @@ inline void MoveBatchEntry(WetFaceBatch& b, int k, int w) {
 // Fluxes and side contributions of the plain wet faces of a batch, the
 // solver type fixed at compile time. (A function of its own: inlined into the
 // chunk loop, the compiler no longer turns this loop into vector code.)
-template <int kSolver, bool kSecond>
+template <int kSolver, bool kSecond, bool kSharedD>
 [[gnu::noinline]] void WetFaceKernel(const FaceLoopInput& in, WetFaceBatch& b, const double* __restrict gex,
                                      const double* __restrict gey, const double* __restrict gnn,
                                      const double* __restrict glen) {
@@ -562,7 +620,7 @@ template <int kSolver, bool kSecond>
     const double ex = gex[i], ey = gey[i], nn = gnn[i];
     RiemannFlux F;
     if constexpr (kSolver == 1) {
-      F = RoeOnlyFaceFluxUnit(sl, sr, ex, ey, nn, entropy_fix, glen[i], g, sqrt_g);
+      F = RoeOnlyFaceFluxUnit<kSharedD>(sl, sr, ex, ey, nn, entropy_fix, glen[i], g, sqrt_g);
     } else {
       F = RiemannFaceFluxUnit(sl, sr, ex, ey, nn, h_min, kSolver, entropy_fix, glen[i], g, sqrt_g);
     }
@@ -589,11 +647,19 @@ void WetFaceFluxes(const FaceLoopInput& in, WetFaceBatch& b, int first, int last
     ex = b.ex, ey = b.ey, nn = b.nn, len = b.len;
   }
   switch (in.solver) {
-    case 1: WetFaceKernel<1, kSecond>(in, b, ex, ey, nn, len); break;
-    case 2: WetFaceKernel<2, kSecond>(in, b, ex, ey, nn, len); break;
-    case 3: WetFaceKernel<3, kSecond>(in, b, ex, ey, nn, len); break;
-    case 4: WetFaceKernel<4, kSecond>(in, b, ex, ey, nn, len); break;
-    default: WetFaceKernel<0, kSecond>(in, b, ex, ey, nn, len); break;
+    case 1:
+      // The batched faces of a second-order run with face d see one d on
+      // both sides.
+      if (kSecond && in.fad != 0) {
+        WetFaceKernel<1, kSecond, true>(in, b, ex, ey, nn, len);
+      } else {
+        WetFaceKernel<1, kSecond, false>(in, b, ex, ey, nn, len);
+      }
+      break;
+    case 2: WetFaceKernel<2, kSecond, false>(in, b, ex, ey, nn, len); break;
+    case 3: WetFaceKernel<3, kSecond, false>(in, b, ex, ey, nn, len); break;
+    case 4: WetFaceKernel<4, kSecond, false>(in, b, ex, ey, nn, len); break;
+    default: WetFaceKernel<0, kSecond, false>(in, b, ex, ey, nn, len); break;
   }
 }
 
@@ -691,7 +757,7 @@ void InteriorFaceChunk(const FaceLoopInput& in, HdSolver& s, double* face_flux_l
     const int L = in.e1[f], R = in.e2[f];
     if constexpr (kSecond) {
       if (s.vector_faces && in.code[L] == kWet && in.code[R] == kWet) {
-        if (!FallsBackToFirstOrder(in, in.h[L], in.h[R])) {
+        if (!FallsBackToFirstOrder(in, i, L, R)) {
           AddReconstructedFace(in, b, rb, f, i, L, R);
           continue;
         }
@@ -699,7 +765,7 @@ void InteriorFaceChunk(const FaceLoopInput& in, HdSolver& s, double* face_flux_l
     }
     SideValues l, r;
     bool first;
-    if (!WetFaceValues<kSecond>(in, s, face_flux_len, f, l, r, first)) continue;
+    if (!WetFaceValues<kSecond>(in, s, face_flux_len, f, i, l, r, first)) continue;
     // First order: plain wet faces into the batch with their face values.
     const bool plain = in.code[L] == kWet && in.code[R] == kWet && PlainFaceDepths(in, l.h, l.d, r.h, r.d);
     if (!kSecond && s.vector_faces && plain) {
@@ -713,7 +779,9 @@ void InteriorFaceChunk(const FaceLoopInput& in, HdSolver& s, double* face_flux_l
     ReconstructFaces(in, rb, b);
     int w = 0;
     for (int k = 0; k < b.n; ++k) {
-      if (PlainFaceDepths(in, b.hl[k], b.dl[k], b.hr[k], b.dr[k])) {
+      if (DrainedAtFace(in, FallBackDepth(in, rb.hL[k], rb.hR[k]), b.hl[k], b.hr[k])) {
+        InteriorFace<true>(in, s, face_flux_len, b.position[k]);
+      } else if (PlainFaceDepths(in, b.hl[k], b.dl[k], b.hr[k], b.dr[k])) {
         if (w != k) MoveBatchEntry(b, k, w);
         ++w;
       } else {

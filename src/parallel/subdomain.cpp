@@ -150,7 +150,6 @@ void SetupSubdomain(Mesh& mesh, const Array1<int>& part, int halo_layers, const 
                     Subdomain& sub) {
   const int ne = mesh.elements.nelements;
   sub = Subdomain{};
-  sub.nelements = ne;
   sub.halo_layers = halo_layers;
   if (run.nprocesses <= 1 || run.process_id < 0) {
     sub.nowned = sub.nlocal = ne;

@@ -44,7 +44,7 @@ struct Subdomain {
   int process = 0;     // this process, 0 .. nprocesses-1
   int nprocesses = 1;
   int halo_layers = 2;
-  int nowned = 0, nlocal = 0, nelements = 0;
+  int nowned = 0, nlocal = 0;
   // Owner (0 .. nprocesses-1) of every element, by local position.
   Array1<int> owner;
 

@@ -9,6 +9,7 @@ if ! command -v mpirun > /dev/null 2>&1; then
   exit 0
 fi
 MPIRUN="mpirun --allow-run-as-root --oversubscribe -np 2"
+export OMPI_MCA_mpi_yield_when_idle=1
 
 d=$(case_dir delete)
 write_setup "$d/setup.toml" 5

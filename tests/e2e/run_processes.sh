@@ -7,6 +7,9 @@
 # volume in full. Skipped without mpirun.
 . ./driver_common.inc
 export TANO_PROGRESS=NONE
+# Idle processes yield the core, so that 4 processes on 2 busy cores do not
+# spin against each other.
+export OMPI_MCA_mpi_yield_when_idle=1
 PY=/usr/bin/python3
 
 if ! command -v mpirun > /dev/null 2>&1; then
