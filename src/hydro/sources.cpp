@@ -213,13 +213,13 @@ void ReportJet(const Mesh& mesh, const SourceRecord& s, double t, int end, int u
   const double scale = IsGeographic(mesh.projection) ? 1.0 / kDegToRad : 1.0;
   const std::string number = std::to_string(s.number);
   if (upstream != 0) {
-    Warning(SubstituteValue("Time % (s). ", t) +
+    Warning(SubstituteValue("Time % (s).", t) + " " +
             SubstituteValue(upstream == 1 ? "Upstream ambient point of jet % on land"
                                           : "Upstream ambient point of jet % outside domain",
                             number));
   }
   if (end < 0) {
-    Warning(SubstituteValue("Time % (s). ", t) +
+    Warning(SubstituteValue("Time % (s).", t) + " " +
             SubstituteValue(end == -1 ? "Position of jet % on land" : "Position of jet % outside domain", number));
   }
   WriteLogLine("");

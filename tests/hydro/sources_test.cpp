@@ -595,7 +595,7 @@ TEST(Jets, JetReleasesAtItsEndAndReportsInTheLog) {
     EXPECT_NE(log.find("Dilution factor"), std::string::npos);
     EXPECT_NE(log.find("upstream distance"), std::string::npos);
     if (*cs.warning) {
-      EXPECT_NE(log.find(cs.warning), std::string::npos) << log;
+      EXPECT_NE(log.find(std::string("(s). ") + cs.warning), std::string::npos) << log;
       EXPECT_EQ(s.jet.end_element, s.element);
     } else {
       EXPECT_EQ(log.find("Position of jet"), std::string::npos) << log;
