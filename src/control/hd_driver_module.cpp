@@ -25,12 +25,16 @@ void HdDriverModule::InitialStep(double t, int& /*run_status*/) {
   t_state_ = t;
 }
 
-void HdDriverModule::OpenOutputs() { OpenOutputFilesHD(outputs_, hd_, *mesh_); }
+void HdDriverModule::OpenOutputs() {
+  OpenOutputFilesHD(outputs_, hd_, *mesh_);
+  OpenSourceOutputHD(hd_);
+}
 
 void HdDriverModule::WriteOutput(int n) {
   // Step -1 writes the current state at the time it was reached.
   const double t = n >= 0 ? n * dt_overall_ : t_state_;
   WriteOutputHD2D(outputs_, hd_, *mesh_, n, t);
+  WriteSourceOutputHD(hd_, n, t);
 }
 
 double HdDriverModule::TimeStep(double t, double t_end) {
@@ -46,7 +50,11 @@ void HdDriverModule::Step(const StepTimes& times, int& run_status) {
 
 void HdDriverModule::CloseOutputs() { CloseOutputFilesHD(outputs_); }
 
-void HdDriverModule::CloseInputs() { CloseBoundaryDataHD(hd_.boundary); }
+void HdDriverModule::CloseInputs() {
+  CloseBoundaryDataHD(hd_.boundary);
+  ClosePrecipitationHD(hd_.precipitation);
+  CloseSourcesHD(hd_);
+}
 
 void HdDriverModule::OutputStatistics() { OutputStatisticsHD(outputs_, *run_); }
 

@@ -35,6 +35,8 @@
 #include "core/run.hpp"
 #include "hydro/bound.hpp"
 #include "hydro/forcing.hpp"
+#include "hydro/forcing_precipitation.hpp"
+#include "hydro/sources.hpp"
 #include "io/zrn.hpp"
 #include "log/log.hpp"
 #include "parallel/exact_sum.hpp"
@@ -347,6 +349,8 @@ struct HdModule {
   HdState state;
   HdBoundary boundary;  // boundary codes and boundary faces
   HdForcing forcing;    // wind, air pressure, Coriolis, tidal potential
+  HdPrecipitation precipitation;  // PRECIPITATION_EVAPORATION
+  HdSources sources;              // SOURCES
 };
 
 // ---- entry points ----------------------------------------------------------------

@@ -54,10 +54,7 @@ struct UnavailableFeature {
 
 constexpr UnavailableFeature kUnavailableFeatures[] = {
     {"DEPTH", "A time-varying depth correction", {{"type", 0}}},
-    {"PRECIPITATION_EVAPORATION", "Precipitation and evaporation",
-     {{"type_of_precipitation", 0}, {"type_of_evaporation", 0}}},
     {"INFILTRATION", "Infiltration", {{"type", 0}}},
-    {"SOURCES", "Sources and sinks", {{"number_of_sources", 0}}},
     {"RADIATION_STRESS", "Radiation stress", {{"type", 0}}},
     {"ICE", "Ice cover", {{"type", 0}}},
     {"TEMPERATURE_SALINITY_MODULE", "Temperature and salinity", {{"temperature_mode", 0}, {"salinity_mode", 0}}},
@@ -126,6 +123,8 @@ void SetupHD(HdModule& hd, const RunControl& run, const TimeAxis& time, const Mo
   SetupWindHD(hd);
   RefuseUnavailableFeaturesHD();
   SetupTideHD(hd);
+  SetupPrecipitationHD(hd, mesh);
+  SetupSourcesHD(hd, mesh);
   SetupSolutionMethodHD(hd);
   if (hd.mode == 2) SetupInitialConditionsHD(hd);
   SetupBoundCondHD(hd, mesh, hd.boundary);

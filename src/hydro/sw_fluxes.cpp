@@ -1268,6 +1268,9 @@ void SetupSolverHD(HdModule& hd, const Mesh& mesh, HdSolver& s) {
   for (BoundaryFaceRecord& rec : s.boundary_faces) unit_normal(rec.face, rec.ex, rec.ey, rec.nn);
 
   s.outflow_factor.assign(ne, 1.0);
+  if (hd.precipitation.Active() || hd.sources.Active()) {
+    for (Array1<double>* a : {&s.src_h, &s.src_P, &s.src_Q}) a->assign(ne, 0.0);
+  }
   for (Array1<double>* a : {&s.sum_h, &s.sum_P, &s.sum_Q}) a->assign(ne, 0.0);
   if (second) {
     for (Array1<double>* a : {&s.eta_x, &s.eta_y, &s.P_x, &s.P_y, &s.Q_x, &s.Q_y}) a->assign(ne, 0.0);
@@ -1280,6 +1283,17 @@ void SetupSolverHD(HdModule& hd, const Mesh& mesh, HdSolver& s) {
   }
   s.thin_water_depth = hd.flood_dry.type > 0 ? 2.0 * hd.flood_dry.drying_depth : 0.0;
   PrepareForcingHD(hd, mesh, s);
+}
+
+void ClearElementSources(HdSolver& s, int n, bool momentum) {
+  double *h = s.src_h.data(), *P = s.src_P.data(), *Q = s.src_Q.data();
+  if (!momentum) {
+    VHD_OMP_PARALLEL_FOR_SIMD
+    for (int e = 1; e <= n; ++e) h[e] = 0.0;
+    return;
+  }
+  VHD_OMP_PARALLEL_FOR_SIMD
+  for (int e = 1; e <= n; ++e) h[e] = P[e] = Q[e] = 0.0;
 }
 
 void BoundaryFaceTerms(const HdModule& hd, HdSolver& s, const Mesh& mesh, const BoundaryFaceRecord& rec) {

@@ -190,6 +190,11 @@ inline bool SourcesActive(const HdSolver& s) {
   return !s.src_h.empty() && !s.src_P.empty() && !s.src_Q.empty();
 }
 
+// Zeroes the element source terms of elements 1 .. n before the forcings
+// and sources of a sub-step add theirs.
+// momentum false: only src_h (the forcings have just set src_P, src_Q).
+void ClearElementSources(HdSolver& s, int n, bool momentum = true);
+
 // Depth correction k of element e (0 when no depth correction is active).
 inline double DepthCorrection(const HdSolver& s, int e) {
   return s.depth_correction.empty() ? 0.0 : s.depth_correction[e];

@@ -217,6 +217,15 @@ void StepHD(HdModule& hd, HdSolver& solver, const Mesh& mesh, double t, double d
   // The forcings first: the level tilting of the boundaries reads them.
   UpdateForcingHD(hd, solver, mesh, t_new, dt);
   UpdateBoundaryValuesHD(hd, mesh, t_new);
+  if (hd.sources.Active() || hd.precipitation.Active()) {
+    // Sources before precipitation and evaporation, whose limit counts
+    // what the sources bring.
+    // The forcings set the momentum terms of every owned element; the
+    // sources and precipitation add theirs.
+    ClearElementSources(solver, st.nelements_owned, !ForcingActiveHD(hd));
+    UpdateSourcesHD(hd, solver, mesh, t_new, dt);
+    UpdatePrecipitationHD(hd, solver, mesh, t_new, dt);
+  }
   stop(kHdTimerForcings);
 
   start(kHdTimerProperties);

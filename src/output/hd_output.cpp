@@ -178,7 +178,7 @@ void OpenOutputFilesHD(HdOutputs& out, const HdModule& hd, const Mesh& mesh) {
   ElementVolumes(out, s, nown);
   out.initial_volume.Clear();
   for (int e = 1; e <= nown; ++e) out.initial_volume += out.volume[e];
-  for (ExactSum* a : {&out.source_inflow, &out.source_outflow, &out.boundaries}) a->Clear();
+  out.boundaries.Clear();
   out.defect_start = hd.flood_dry.mass_correction;
   for (OutputSpec& spec : out.list.outputs) {
     if (spec.type != kOutputMassBudget) continue;
@@ -195,15 +195,14 @@ void UpdateOutputsHD(HdOutputs& out, const HdModule& hd, const HdSolver& solver,
   for (int f : out.boundary_faces)
     if (s.face_flux_len[f] != 0.0) out.boundaries += -s.face_flux_len[f] * dt;
 
-  // Element sources of the last stage, which made the update of the sub-step.
-  const bool sources = solver.src_h.size() >= nown;
-  if (sources) {
-    for (int e = 1; e <= nown; ++e) {
-      const double r = solver.src_h[e] * out.area[e];
-      out.rate[e] = r;
-      if (r > 0) out.source_inflow += r * dt;
-      else if (r < 0) out.source_outflow += r * dt;
-    }
+  // Sources (their discharge per element) and precipitation less
+  // evaporation (the process term) of the sub-step.
+  const bool sources = hd.sources.Active();
+  const bool process = hd.precipitation.Active();
+  if (process) {
+    const double* area = ElementAreasHD(solver, mesh);
+    const HdPrecipitation& p = hd.precipitation;
+    for (int e = 1; e <= nown; ++e) out.rate[e] = (p.gain[e] - p.loss[e]) * area[e];
   }
 
   const bool cuts = hd.flood_dry.type > 0 && hd.flood_dry.mass_cut.size() >= nown;
@@ -213,7 +212,8 @@ void UpdateOutputsHD(HdOutputs& out, const HdModule& hd, const HdSolver& solver,
         if (spec.budget.components[c].index != 0) continue;
         const int k = static_cast<int>(c);
         AccumulateBudgetTransport(spec.budget, k, s.face_flux_len, dt);
-        if (sources) AccumulateBudgetSource(spec.budget, k, out.rate, dt);
+        if (sources) AccumulateBudgetSource(spec.budget, k, hd.sources.element_rate, dt);
+        if (process) AccumulateBudgetProcess(spec.budget, k, out.rate, dt);
         if (cuts) AccumulateBudgetDefect(spec.budget, k, hd.flood_dry.mass_cut);
       }
     } else if (spec.type == kOutputDischarge) {
@@ -344,8 +344,12 @@ VolumeBalance VolumeBalanceHD(const HdOutputs& out, const HdModule& hd, const Me
   b.initial = total(out.initial_volume);
   b.final_wet = total(wet);
   b.final_dry = total(dry);
-  b.source_inflow = total(out.source_inflow);
-  b.source_outflow = total(out.source_outflow);
+  b.source_inflow = total(hd.sources.inflow);
+  b.source_outflow = total(hd.sources.outflow);
+  ExactSum precipitation, evaporation;
+  PrecipitationVolumesHD(hd.precipitation, nown, precipitation, evaporation);
+  b.precipitation = total(precipitation);
+  b.evaporation = total(evaporation);
   b.boundaries = total(out.boundaries);
   b.defect = total(defect);
   b.show_sources = hd.mode > 1;

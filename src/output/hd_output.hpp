@@ -86,8 +86,9 @@ struct HdOutputs {
   // Accounting of the water volume (this process's owned elements and
   // boundary faces, m3), as exact sums so that the totals over the processes
   // do not depend on the split of the mesh.
+  // (The volumes of sources, precipitation and evaporation are booked by
+  // their own records in the module.)
   ExactSum initial_volume;
-  ExactSum source_inflow, source_outflow;
   ExactSum boundaries;
   ExactSum defect_start;  // the module's volume correction at the start
   Array1<int> boundary_faces;  // owned faces on the model boundary
@@ -97,7 +98,7 @@ struct HdOutputs {
   Array1<double> values;  // element values of one item
   Array1<double> nodes;   // node values of one item
   Array1<double> volume;  // element volume h A (m3)
-  Array1<double> rate;    // element source rate (m3/s)
+  Array1<double> rate;    // element rate of precipitation and evaporation (m3/s)
 };
 
 // mesh: the HD velocity mesh.

@@ -18,54 +18,7 @@ if ! command -v mpirun > /dev/null 2>&1; then
 fi
 EXAMPLE=$(cd ../../examples/default && pwd)
 
-# run_case DIR NPROCESSES NTHREADS: runs DIR/setup.toml in a copy DIR_nN_tT.
-run_case() {
-  r="$1_n$2_t$3"
-  mkdir -p "$r"
-  cp "$1"/* "$r"/
-  if [ "$2" -eq 1 ]; then
-    OMP_NUM_THREADS=$3 timeout 600 "$VANTORHD" "$r/setup.toml" > "$r/out" 2>&1
-  else
-    OMP_NUM_THREADS=$3 timeout 600 mpirun --allow-run-as-root --oversubscribe -np "$2" \
-      "$VANTORHD" "$r/setup.toml" > "$r/out" 2>&1
-  fi
-  status_is 0 $? "$r"
-  contains "$r/setup.log" "  Normal run completion"
-}
-
-# same_results REFERENCE OTHER: the result files and the volume balance agree.
-same_results() {
-  sed -n '/= Volume balance =/,/Volume defect/p' "$1/setup.log" > "$1/balance"
-  sed -n '/= Volume balance =/,/Volume defect/p' "$2/setup.log" > "$2/balance"
-  [ -s "$1/balance" ] || fail "$1: no volume balance in the log"
-  cmp -s "$1/balance" "$2/balance" || fail "volume balance of $2 differs from $1"
-  if ! "$PY" - "$1" "$2" > "$2/compare.out" 2>&1 <<'PY'
-import glob, os, sys
-import numpy as np
-import netCDF4
-a, b = sys.argv[1], sys.argv[2]
-bad = []
-files = [f for f in sorted(glob.glob(os.path.join(a, "*.zrn*"))) if not os.path.basename(f).startswith("tide")]
-if not files:
-    bad.append("no result files")
-for fa in files:
-    fb = os.path.join(b, os.path.basename(fa))
-    with netCDF4.Dataset(fa) as da, netCDF4.Dataset(fb) as db:
-        if set(da.variables) != set(db.variables):
-            bad.append(f"{fb}: other variables")
-            continue
-        for v in da.variables:
-            x, y = np.ma.getdata(da.variables[v][:]), np.ma.getdata(db.variables[v][:])
-            if x.shape != y.shape or not np.array_equal(x, y, equal_nan=x.dtype.kind == "f"):
-                bad.append(f"{fb}: {v} differs")
-print("\n".join(bad))
-sys.exit(1 if bad else 0)
-PY
-  then
-    fail "results of $2 differ from $1"
-    cat "$2/compare.out"
-  fi
-}
+. ./processes_common.inc
 
 # ---- the bundled example -----------------------------------------------------
 

@@ -211,8 +211,7 @@ TEST(SetupHDDeath, FeaturesNotInTheBuildStopTheRunWhenSwitchedOn) {
   struct Case {
     std::string section, keys, message;
   } cases[] = {
-      {"PRECIPITATION_EVAPORATION", "type_of_evaporation = 2\n", "evaporation" + na + "type_of_evaporation = 2"},
-      {"SOURCES", "number_of_sources = 1\n", "Sources and sinks" + na + "number_of_sources = 1"},
+      {"PRECIPITATION_EVAPORATION", "type_of_evaporation = 2\n", "heat exchange" + na + "type_of_evaporation = 2"},
       {"ICE", "type = 2\n", "Ice cover" + na + "type = 2"},
       {"DEPTH", "type = 1\n", "depth correction" + na + "type = 1"},
       {"RADIATION_STRESS", "type = 1\n", "Radiation stress" + na},
