@@ -175,7 +175,7 @@ void ReadCode(const HdModule& hd, BoundaryCondition& b) {
 
 // Chooses the tilting point of a level boundary with a Coriolis or wind
 // correction, after checking that the boundary is one connected stretch.
-void ChooseTiltingPoint(const HdModule& hd, const Mesh& mesh, BoundaryCondition& b, const std::vector<int>& faces) {
+void ChooseTiltingPoint(const Mesh& mesh, BoundaryCondition& b, const std::vector<int>& faces) {
   if (!LevelType(b.type) || (b.type_of_coriolis_correction == 0 && b.type_of_wind_correction == 0)) return;
   if (b.nsections != 1) {
     FatalError("SetupBoundCondHD: Only one section allowed when coriolis/wind correction is included (" +
@@ -320,7 +320,7 @@ void SetupBoundCondHD(HdModule& hd, const Mesh& mesh, HdBoundary& bc) {
       Warning("No section CODE_" + std::to_string(code) +
               " in BOUNDARY_CONDITIONS: the open boundary is closed (land)");
     }
-    ChooseTiltingPoint(hd, mesh, b, faces);
+    ChooseTiltingPoint(mesh, b, faces);
     try {
       b.buffer.assign(b.nfaces, 0.0);
     } catch (const std::bad_alloc&) {
