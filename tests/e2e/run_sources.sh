@@ -19,65 +19,8 @@ fi
 . ./processes_common.inc
 
 d=$(case_dir sources)
-"$PY" - "$d/slope.mesh" <<'PYMESH'
-import sys
-# 1200 m x 300 m of 50 m cells, quadrilaterals west of x = 600 m and
-# triangles east of it; the bed rises from 2 m below datum to 2 m above it,
-# with a mound; closed.
-nx, ny, d = 24, 6, 50.0
-def bed(x, y):
-    mound = 1.5 if (x - 800.0) ** 2 + (y - 150.0) ** 2 < 100.0 ** 2 else 0.0
-    return -2.0 + 4.0 * x / (nx * d) + mound
-def code(i, j):
-    return 1 if i in (0, nx) or j in (0, ny) else 0
-nodes = [(j * (nx + 1) + i + 1, i * d, j * d) for j in range(ny + 1) for i in range(nx + 1)]
-elements = []
-for j in range(ny):
-    for i in range(nx):
-        a = j * (nx + 1) + i + 1
-        b, c, e = a + 1, a + nx + 2, a + nx + 1
-        elements += [(a, b, c, e)] if i < nx // 2 else [(a, b, c, 0), (a, c, e, 0)]
-with open(sys.argv[1], "w") as f:
-    f.write(f"100079 1000 {len(nodes)} UTM-32\n")
-    for k, x, y in nodes:
-        f.write(f"{k} {500000 + x:.1f} {6000000 + y:.1f} {bed(x, y):.3f} {code(round(x / d), round(y / d))}\n")
-    f.write(f"{len(elements)} 4 25\n")
-    for k, el in enumerate(elements, 1):
-        f.write(f"{k} {' '.join(map(str, el))}\n")
-PYMESH
-cat > "$d/setup.toml" <<'SETUP'
-[VantorHD]
-
-[VantorHD.TIME]
-start_time = [2004, 1, 1, 0, 0, 0]
-time_step_interval = 30.0
-number_of_time_steps = 40
-
-[VantorHD.DOMAIN]
-file_name = "slope.mesh"
-
-[VantorHD.MODULE_SELECTION]
-mode_of_hydrodynamic_module = 2
-
-[VantorHD.HYDRODYNAMIC_MODULE]
-mode = 2
-
-[VantorHD.HYDRODYNAMIC_MODULE.SOLUTION_TECHNIQUE]
-scheme_of_time_integration = 2
-scheme_of_space_discretization_horizontal = 2
-
-[VantorHD.HYDRODYNAMIC_MODULE.FLOOD_AND_DRY]
-type = 2
-
-[VantorHD.HYDRODYNAMIC_MODULE.BED_RESISTANCE]
-type = 4
-[VantorHD.HYDRODYNAMIC_MODULE.BED_RESISTANCE.MANNING_NUMBER]
-format = 0
-constant_value = 32.0
-
-[VantorHD.HYDRODYNAMIC_MODULE.INITIAL_CONDITIONS]
-type = 1
-surface_elevation_constant = -1.0
+write_slope "$d" closed
+cat >> "$d/setup.toml" <<'SETUP'
 
 [VantorHD.HYDRODYNAMIC_MODULE.PRECIPITATION_EVAPORATION]
 type_of_precipitation = 1
