@@ -39,10 +39,15 @@ void SpecMassBudget(MassBudgetSpec& budget, const std::vector<std::string>& comp
   for (int k = 1; k <= kBudgetItems; ++k) SktReadKeyword(kItemKeywords[k - 1], budget.item_flags[k - 1], 1);
 
   budget.components.clear();
-  if (budget.flow == 1) budget.components.push_back(BudgetComponent{" Flow", 0});
+  auto add = [&](std::string name, int index) {
+    budget.components.emplace_back();
+    budget.components.back().name = std::move(name);
+    budget.components.back().index = index;
+  };
+  if (budget.flow == 1) add(" Flow", 0);
   for (std::size_t k = 0; k < component_names.size(); ++k)
     if (budget.component_flags[k] == 1)
-      budget.components.push_back(BudgetComponent{" " + component_names[k], static_cast<int>(k) + 1});
+      add(" " + component_names[k], static_cast<int>(k) + 1);
   if (budget.components.empty()) FatalError("SpecMassBudget: No components selected");
   bool any_item = false;
   for (int f : budget.item_flags) any_item = any_item || f == 1;

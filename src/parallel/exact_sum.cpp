@@ -41,23 +41,14 @@ void ExactSum::Add(double x) {
   if (++pending_ >= kCarryEvery) Normalise();
 }
 
-void ExactSum::Add(const ExactSum& other) {
+void ExactSum::Merge(const ExactSum& other, int sign) {
   ExactSum o = other;
   o.Normalise();
   Normalise();
-  for (int i = 0; i < kLimbs; ++i) limb_[i] += o.limb_[i];
+  for (int i = 0; i < kLimbs; ++i) limb_[i] += sign * o.limb_[i];
   pending_ = 1;
-  special_ |= o.special_;
-}
-
-void ExactSum::Subtract(const ExactSum& other) {
-  ExactSum o = other;
-  o.Normalise();
-  Normalise();
-  for (int i = 0; i < kLimbs; ++i) limb_[i] -= o.limb_[i];
-  pending_ = 1;
-  // inf - inf is NaN; a lone infinity changes its sign.
-  special_ |= (o.special_ & 4) | ((o.special_ & 1) << 1) | ((o.special_ & 2) >> 1);
+  // Subtracted, an infinity changes its sign (inf - inf is NaN).
+  special_ |= sign > 0 ? o.special_ : (o.special_ & 4) | ((o.special_ & 1) << 1) | ((o.special_ & 2) >> 1);
 }
 
 void ExactSum::Normalise() {

@@ -29,8 +29,8 @@ class ExactSum {
   static constexpr int kLimbs = 68;  // 2^-1074 .. 2^1102: every finite double and its carries
 
   void Add(double x);
-  void Add(const ExactSum& other);
-  void Subtract(const ExactSum& other);
+  void Add(const ExactSum& other) { Merge(other, 1); }
+  void Subtract(const ExactSum& other) { Merge(other, -1); }
   ExactSum& operator+=(double x) {
     Add(x);
     return *this;
@@ -45,6 +45,8 @@ class ExactSum {
   void SumOverProcesses(const RunControl& run);
 
  private:
+  void Merge(const ExactSum& other, int sign);  // sign +1 or -1
+
   std::array<std::int64_t, kLimbs> limb_{};
   int pending_ = 0;  // terms added since the last normalisation
   // Non-finite terms: bit 0 +inf, bit 1 -inf, bit 2 NaN.
