@@ -50,9 +50,9 @@ double ExchangeValue(const AdExchange& x, int e, double c) {
 }
 
 // Dispersion coefficient of a face between elements of coefficients a, b:
-// min(a + b, 4 a, 4 b) / 4 (so that a = b = D gives D, and the face value is
+// min(a + b, 4 a, 4 b) / 2 (so that a = b = D gives D, and the face value is
 // at most twice the smaller one).
-inline double FaceDispersion(double a, double b) { return 0.25 * std::min(a + b, 4.0 * std::min(a, b)); }
+inline double FaceDispersion(double a, double b) { return 0.5 * std::min(a + b, 4.0 * std::min(a, b)); }
 
 // Longitude difference taken the short way round (radians).
 inline double WrapLongitude(double dx) { return std::remainder(dx, 2.0 * std::numbers::pi); }
@@ -250,7 +250,7 @@ void AdSolver::Setup(const HdModule& hd, const HdSolver& hd_solver, const Mesh& 
 
   SetupGradient(mesh, technique.gradient_calculation, Array1<int>(), Array1<int>(), 2,
                 technique.boundary_correction, 0, stencil_);
-  if (technique.gradient_limiter == kLimiterBarthJespersen) SetupLimiterGeometry2D(mesh, limiter_geometry_);
+  if (technique.gradient_limiter != kLimiterNone) SetupLimiterGeometry2D(mesh, limiter_geometry_);
 
   const int ne = st.nelements;
   for (Array1<double>* a : {&m_base_, &m_, &gx_, &gy_, &gx_raw_, &gy_raw_}) a->assign(ne, 0.0);
@@ -383,7 +383,12 @@ void AdSolver::WaterRates(const AdFlow& flow, double n_inv) {
   }
 }
 
-void AdSolver::Gradients(const AdComponent& comp, const Array1<int>& wetdry) {
+void AdSolver::Gradients(const AdFlow& flow, const AdComponent& comp) {
+  // Limited gradients of c, with the wet/dry codes as the limiter's activity
+  // flags. The limiter does not see the values at open boundary faces, so an
+  // element that takes water in through one keeps the first order (its
+  // reconstruction could otherwise reach past the water entering it).
+  const Array1<int>& wetdry = flow.wetdry;
   const int limiter = technique_.gradient_limiter;
   if (limiter == kLimiterENO || limiter == kLimiterWeighted) {
     CALCGRADIENTELEMENT2D(stencil_, comp.c, gx_raw_, gy_raw_);
@@ -395,7 +400,54 @@ void AdSolver::Gradients(const AdComponent& comp, const Array1<int>& wetdry) {
     if (limiter == kLimiterBarthJespersen)
       CALCLIMITEDGRADIENTBJ2D(limiter_geometry_, comp.c, wetdry, gx_, gy_, gx_, gy_, kLimiterEpsilon);
   }
+  if (limiter != kLimiterNone) LimitAtClosedFaces(comp, wetdry);
+  const Array1<BoundaryFaceCondition>& bf = hd_->boundary.faces;
+  for (int i = 1; i <= bf.size(); ++i) {
+    const int e = bf[i].element;
+    if (e <= nowned_ && flow.face_volume[bf[i].face] < 0) gx_[e] = gy_[e] = 0.0;
+  }
   if (subdomain_ && subdomain_->Active()) ExchangeHalo(*subdomain_, {&gx_, &gy_});
+}
+
+void AdSolver::LimitAtClosedFaces(const AdComponent& comp, const Array1<int>& wetdry) {
+  // The mesh limiters bound the reconstruction at faces to wet neighbours
+  // only. A wet element with a boundary face or a face to an element that is
+  // not wet is scaled (Barth-Jespersen) so that the value reconstructed at
+  // those faces too stays within the range of the element and its wet
+  // neighbours: otherwise a gradient along the wall could lift every face
+  // value to an open neighbour above a local minimum, and the minimum would
+  // fall.
+  const LimiterGeometry2D& g = limiter_geometry_;
+  const int nf = g.faces;
+  const double* c = comp.c.data();
+  const int* code = wetdry.data();
+  VHD_OMP_PARALLEL_FOR
+  for (int e = 1; e <= nowned_; ++e) {
+    if (code[e] != kWet) continue;
+    double lo = c[e], hi = c[e];
+    bool closed = false;
+    for (int j = 0; j < nf; ++j) {
+      const int nb = g.neighbour[static_cast<std::size_t>(e) * nf + j];
+      if (nb > 0 && code[nb] == kWet) {
+        lo = std::min(lo, c[nb]);
+        hi = std::max(hi, c[nb]);
+      } else {
+        closed = true;
+      }
+    }
+    if (!closed) continue;
+    double alpha = 1.0;
+    for (int j = 0; j < nf; ++j) {
+      const std::size_t k = static_cast<std::size_t>(e) * nf + j;
+      const int nb = g.neighbour[k];
+      if (nb > 0 && code[nb] == kWet) continue;
+      const double D = gx_[e] * g.dx[k] + gy_[e] * g.dy[k];
+      if (D > kLimiterEpsilon) alpha = std::min(alpha, (hi - c[e]) / D);
+      if (D < -kLimiterEpsilon) alpha = std::min(alpha, (lo - c[e]) / D);
+    }
+    gx_[e] *= alpha;
+    gy_[e] *= alpha;
+  }
 }
 
 void AdSolver::FaceFluxes(const AdFlow& flow, const AdComponent& comp, double frac, double n_inv, double weight) {
@@ -548,7 +600,7 @@ int AdSolver::Step(const AdFlow& flow, AdComponent& comp) {
     for (int s = 0; s < nstages; ++s) {
       const StageRule& r = rules[s];
       const double frac_out = k + 1 == n && r.frac == 1.0 ? 1.0 : (k + r.frac) * n_inv;
-      if (gradients) Gradients(comp, flow.wetdry);
+      if (gradients) Gradients(flow, comp);
       FaceFluxes(flow, comp, (k + frac_in) * n_inv, n_inv, r.weight * r.w);
       UpdateElements(flow, comp, r.alpha, r.w, frac_out, n_inv, r.weight, s + 1 == nstages);
       if (exchange) ExchangeHalo(*subdomain_, {&comp.c});

@@ -49,7 +49,7 @@
 // side that is not wet carries only advection, first order, with the
 // concentration of the upwind element (which held the water). Dispersion at
 // a face between two wet elements: F_d = -L D_f h_f dc/dn with
-// D_f = min(D_L + D_R, 4 D_L, 4 D_R) / 4 (so D for D_L = D_R = D, at most
+// D_f = min(D_L + D_R, 4 D_L, 4 D_R) / 2 (so D for D_L = D_R = D, at most
 // twice the smaller), h_f the mean depth of the two sides and dc/dn the
 // two-point difference over the normal distance of the centres plus the
 // tangential correction from the mean of the two element gradients.
@@ -225,7 +225,8 @@ class AdSolver {
   int SubStepCount(const AdFlow& flow, const AdComponent& comp);
   void SurfaceAndSources(const AdFlow& flow, AdComponent& comp, double n_inv);
   void WaterRates(const AdFlow& flow, double n_inv);
-  void Gradients(const AdComponent& comp, const Array1<int>& wetdry);
+  void Gradients(const AdFlow& flow, const AdComponent& comp);
+  void LimitAtClosedFaces(const AdComponent& comp, const Array1<int>& wetdry);
   void FaceFluxes(const AdFlow& flow, const AdComponent& comp, double frac, double n_inv, double weight);
   void UpdateElements(const AdFlow& flow, AdComponent& comp, double alpha, double w, double frac, double n_inv,
                       double weight, bool sub_end);
