@@ -248,6 +248,22 @@ void AdSolver::Setup(const HdModule& hd, const HdSolver& hd_solver, const Mesh& 
     face_oy2_[f] = F.yf[f] - E.yc[b];
   }
 
+  // Per element slot (the HD solver's face planes): the element across the
+  // face (0: boundary or no face) and L / (d.n) of the face (1, 0 on the
+  // boundary), for the dispersive conductance of the time-step rule.
+  const int planes = hd_solver.face_planes, stride = hd_solver.plane_stride;
+  slot_neighbour_.assign(planes * stride, 0);
+  slot_conductance_.assign(planes * stride, 0.0);
+  for (int j = 0; j < planes; ++j) {
+    for (int e = 1; e <= nowned_; ++e) {
+      const int k = j * stride + e;
+      const int f = hd_solver.slot_face_side[k] >> 1;
+      if (f == 0 || F.element2[f] <= 0) continue;
+      slot_neighbour_[k] = F.element1[f] == e ? F.element2[f] : F.element1[f];
+      slot_conductance_[k] = face_len_[f] * face_idn_[f];
+    }
+  }
+
   SetupGradient(mesh, technique.gradient_calculation, Array1<int>(), Array1<int>(), 2,
                 technique.boundary_correction, 0, stencil_);
   if (technique.gradient_limiter != kLimiterNone) SetupLimiterGeometry2D(mesh, limiter_geometry_);
@@ -271,31 +287,34 @@ int AdSolver::SubStepCount(const AdFlow& flow, const AdComponent& comp) {
   // end depths). The transport sub-step is CFL_critical_AD / max r, within
   // dt_min_AD and dt_max_AD; the HD sub-step is split into n equal ones.
   const HdSolver& hs = *hd_solver_;
-  const FaceTable& F = mesh_->faces;
   const double dt = flow.dt;
   const double* vol = flow.face_volume.data();
   const double* D = comp.dispersion.empty() ? nullptr : comp.dispersion.data();
+  const double* h0 = flow.h_start.data();
+  const double* h1 = flow.h_end.data();
+  const int* code0 = flow.wetdry.data();
+  const int* code1 = flow.wetdry_end.data();
   const double h_min = technique_.h_min;
   const int* slots = hs.slot_face_side.data();
+  const int* across = slot_neighbour_.data();
+  const double* conduct = slot_conductance_.data();
   const int planes = hs.face_planes, stride = hs.plane_stride;
   double rmax = 0.0;
   VHD_OMP_PARALLEL_FOR_REDUCTION(max, rmax)
   for (int e = 1; e <= nowned_; ++e) {
     cfl_[e] = 0.0;
-    const double h = std::min(flow.h_start[e], flow.h_end[e]);
-    if (flow.wetdry[e] != kWet || flow.wetdry_end[e] != kWet || !(h > h_min)) continue;
+    const double h = std::min(h0[e], h1[e]);
+    if (code0[e] != kWet || code1[e] != kWet || !(h > h_min)) continue;
     double out = 0.0, conductance = 0.0;
     for (int j = 0; j < planes; ++j) {
-      const int m = slots[j * stride + e];
-      const int f = m >> 1;
-      if (f == 0) continue;
-      const double leaving = (m & 1) ? -vol[f] : vol[f];
+      const int k = j * stride + e;
+      const int m = slots[k];
+      const double leaving = (m & 1) ? -vol[m >> 1] : vol[m >> 1];
       out += std::max(0.0, leaving);
-      const int nb = (m & 1) ? F.element1[f] : F.element2[f];
-      if (D && nb > 0 && flow.wetdry[nb] == kWet) {
-        const double hf = 0.5 * (std::max(flow.h_start[e], flow.h_end[e]) + std::max(flow.h_start[nb], flow.h_end[nb]));
-        conductance += FaceDispersion(D[e], D[nb]) * hf * face_len_[f] * face_idn_[f];
-      }
+      const int nb = across[k];
+      if (D && nb > 0 && code0[nb] == kWet)
+        conductance += FaceDispersion(D[e], D[nb]) * 0.5 * (std::max(h0[e], h1[e]) + std::max(h0[nb], h1[nb])) *
+                       conduct[k];
     }
     const double rate = (out / dt + conductance) / (area_[e] * h);
     cfl_[e] = rate;
@@ -313,14 +332,19 @@ int AdSolver::SubStepCount(const AdFlow& flow, const AdComponent& comp) {
   return n;
 }
 
-void AdSolver::SurfaceAndSources(const AdFlow& flow, AdComponent& comp, double n_inv) {
-  // Precipitation, evaporation and the water of cut depths (carrying the
-  // element's concentration) per element, then the point sources, with the
-  // concentrations at the start of the sub-step. The water itself goes into
-  // source_water_ by the same operations with the concentration 1.
+void AdSolver::SurfaceAndSources(const AdFlow& flow, AdComponent& comp, double n_inv, double t0) {
+  // The mass and depth at the start of the sub-step (time fraction t0 of the
+  // HD sub-step); precipitation, evaporation and the water of cut depths
+  // (carrying the element's concentration) per element, then the point
+  // sources, with the concentrations at the start of the sub-step. The water
+  // itself goes into source_water_ by the same operations with the
+  // concentration 1.
   const double* c = comp.c.data();
   VHD_OMP_PARALLEL_FOR
   for (int e = 1; e <= nowned_; ++e) {
+    const double h = flow.h_start[e] + t0 * (flow.h_end[e] - flow.h_start[e]);
+    m_base_[e] = m_[e] = c[e] * h;
+    h_base_[e] = h_[e] = h;
     const double surface = n_inv * (flow.precipitation[e] * ExchangeValue(comp.precipitation, e, c[e]) -
                                     flow.evaporation[e] * ExchangeValue(comp.evaporation, e, c[e]));
     const double cut = n_inv * flow.cut[e] * c[e];
@@ -360,26 +384,6 @@ void AdSolver::SurfaceAndSources(const AdFlow& flow, AdComponent& comp, double n
       source_water_[t] += released * 1.0;
       comp.source_inflow.Add(mass);
     }
-  }
-}
-
-void AdSolver::WaterRates(const AdFlow& flow, double n_inv) {
-  // The depth change per area over the sub-step of every owned element:
-  // the face volumes and the water of the sources, summed exactly as the
-  // element update sums the masses.
-  const HdSolver& hs = *hd_solver_;
-  const int* slots = hs.slot_face_side.data();
-  const int planes = hs.face_planes, stride = hs.plane_stride;
-  const double* vol = flow.face_volume.data();
-  VHD_OMP_PARALLEL_FOR
-  for (int e = 1; e <= nowned_; ++e) {
-    double in = 0.0;
-    for (int j = 0; j < planes; ++j) {
-      const int m = slots[j * stride + e];
-      const double v = n_inv * vol[m >> 1];
-      in += (m & 1) ? v : -v;
-    }
-    water_rate_[e] = (in + source_water_[e]) / area_[e];
   }
 }
 
@@ -526,7 +530,7 @@ void AdSolver::FaceFluxes(const AdFlow& flow, const AdComponent& comp, double fr
 }
 
 void AdSolver::UpdateElements(const AdFlow& flow, AdComponent& comp, double alpha, double w, double frac,
-                              double n_inv, double weight, bool sub_end) {
+                              double n_inv, double weight, bool first, bool sub_end) {
   // The stage advances the mass and, by the same operations, the water
   // depth carried by the face volumes (so that a uniform concentration has
   // exactly its mass); c = m / h of that depth. frac: time of the stage's
@@ -538,6 +542,7 @@ void AdSolver::UpdateElements(const AdFlow& flow, AdComponent& comp, double alph
   const int* slots = hs.slot_face_side.data();
   const int planes = hs.face_planes, stride = hs.plane_stride;
   const double* flux = face_flux_.data();
+  const double* vol = flow.face_volume.data();
   const double* h0 = flow.h_start.data();
   const double* h1 = flow.h_end.data();
   const double dt_sub = flow.dt * n_inv;
@@ -547,12 +552,19 @@ void AdSolver::UpdateElements(const AdFlow& flow, AdComponent& comp, double alph
   double* c = comp.c.data();
   VHD_OMP_PARALLEL_FOR
   for (int e = 1; e <= nowned_; ++e) {
-    double in = 0.0;
+    double in = 0.0, water = 0.0;
     for (int j = 0; j < planes; ++j) {
       const int m = slots[j * stride + e];
       in += (m & 1) ? flux[m >> 1] : -flux[m >> 1];
+      if (first) {
+        const double v = n_inv * vol[m >> 1];
+        water += (m & 1) ? v : -v;
+      }
     }
     const double A = area_[e];
+    // The depth change of the sub-step per area, summed as the mass is (the
+    // same for every stage).
+    if (first) water_rate_[e] = (water + source_water_[e]) / A;
     const double R = (in + source_mass_[e]) / A;
     const double k = k_field ? k_field[e] : k_const;
     const double pre = alpha * m_base_[e] + (1.0 - alpha) * m_[e] + w * R;
@@ -586,23 +598,14 @@ int AdSolver::Step(const AdFlow& flow, AdComponent& comp) {
 
   for (int k = 0; k < n; ++k) {
     const double t0 = k * n_inv;  // start of the sub-step, fraction of the HD sub-step
-    SurfaceAndSources(flow, comp, n_inv);
-    WaterRates(flow, n_inv);
-    VHD_OMP_PARALLEL_FOR
-    for (int e = 1; e <= nowned_; ++e) {
-      const double h = flow.h_start[e] + t0 * (flow.h_end[e] - flow.h_start[e]);
-      m_base_[e] = comp.c[e] * h;
-      m_[e] = m_base_[e];
-      h_base_[e] = h;
-      h_[e] = h;
-    }
+    SurfaceAndSources(flow, comp, n_inv, t0);
     double frac_in = 0.0;
     for (int s = 0; s < nstages; ++s) {
       const StageRule& r = rules[s];
       const double frac_out = k + 1 == n && r.frac == 1.0 ? 1.0 : (k + r.frac) * n_inv;
       if (gradients) Gradients(flow, comp);
       FaceFluxes(flow, comp, (k + frac_in) * n_inv, n_inv, r.weight * r.w);
-      UpdateElements(flow, comp, r.alpha, r.w, frac_out, n_inv, r.weight, s + 1 == nstages);
+      UpdateElements(flow, comp, r.alpha, r.w, frac_out, n_inv, r.weight, s == 0, s + 1 == nstages);
       if (exchange) ExchangeHalo(*subdomain_, {&comp.c});
       frac_in = r.frac;
     }

@@ -223,13 +223,12 @@ class AdSolver {
 
  private:
   int SubStepCount(const AdFlow& flow, const AdComponent& comp);
-  void SurfaceAndSources(const AdFlow& flow, AdComponent& comp, double n_inv);
-  void WaterRates(const AdFlow& flow, double n_inv);
+  void SurfaceAndSources(const AdFlow& flow, AdComponent& comp, double n_inv, double t0);
   void Gradients(const AdFlow& flow, const AdComponent& comp);
   void LimitAtClosedFaces(const AdComponent& comp, const Array1<int>& wetdry);
   void FaceFluxes(const AdFlow& flow, const AdComponent& comp, double frac, double n_inv, double weight);
   void UpdateElements(const AdFlow& flow, AdComponent& comp, double alpha, double w, double frac, double n_inv,
-                      double weight, bool sub_end);
+                      double weight, bool first, bool sub_end);
 
   const HdModule* hd_ = nullptr;
   const HdSolver* hd_solver_ = nullptr;  // its interior faces and element face slots
@@ -248,6 +247,11 @@ class AdSolver {
   // face centre minus each centroid (mesh units).
   Array1<double> face_idn_, face_tx_, face_ty_;
   Array1<double> face_ox1_, face_oy1_, face_ox2_, face_oy2_;
+
+  // Per element slot of the HD solver's face planes: the element across
+  // (0: none) and the face length over the normal centre distance.
+  Array1<int> slot_neighbour_;
+  Array1<double> slot_conductance_;
 
   GradientStencil stencil_;
   LimiterGeometry2D limiter_geometry_;

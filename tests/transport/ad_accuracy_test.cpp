@@ -141,7 +141,9 @@ TEST(TransportAccuracy, DecayIsImplicitPerStage) {
       previous = ratio;
     }
     EXPECT_NEAR(previous / expected, 1.0, 1e-15 * (r.steps + 10));
-    if (r.dtk <= 1e-5) EXPECT_NEAR(previous / std::exp(-k * dt * r.steps), 1.0, 1e-6);
+    if (r.dtk <= 1e-5) {
+      EXPECT_NEAR(previous / std::exp(-k * dt * r.steps), 1.0, 1e-6);
+    }
     double decayed = 0.0;
     for (int e = 1; e <= c.c.hd.state.nelements_owned; ++e) decayed += c.comp.decay_total[e];
     EXPECT_NEAR(decayed / (2.0 * m0), 1.0 - previous, 1e-12);
