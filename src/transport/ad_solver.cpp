@@ -248,20 +248,14 @@ void AdSolver::Setup(const HdModule& hd, const HdSolver& hd_solver, const Mesh& 
     face_oy2_[f] = F.yf[f] - E.yc[b];
   }
 
-  // Per element slot (the HD solver's face planes): the element across the
-  // face (0: boundary or no face) and L / (d.n) of the face (1, 0 on the
-  // boundary), for the dispersive conductance of the time-step rule.
-  const int planes = hd_solver.face_planes, stride = hd_solver.plane_stride;
-  slot_neighbour_.assign(planes * stride, 0);
-  slot_conductance_.assign(planes * stride, 0.0);
-  for (int j = 0; j < planes; ++j) {
-    for (int e = 1; e <= nowned_; ++e) {
-      const int k = j * stride + e;
-      const int f = hd_solver.slot_face_side[k] >> 1;
-      if (f == 0 || F.element2[f] <= 0) continue;
-      slot_neighbour_[k] = F.element1[f] == e ? F.element2[f] : F.element1[f];
-      slot_conductance_[k] = face_len_[f] * face_idn_[f];
-    }
+  // Per element: the sum over its faces to neighbours of L / (d.n), the
+  // dispersive conductance per unit coefficient and depth.
+  element_conductance_.assign(st.nelements, 0.0);
+  for (int f = 1; f <= nf; ++f) {
+    const int a = F.element1[f], b = F.element2[f];
+    if (a <= 0 || b <= 0) continue;
+    element_conductance_[a] += face_len_[f] * face_idn_[f];
+    element_conductance_[b] += face_len_[f] * face_idn_[f];
   }
 
   SetupGradient(mesh, technique.gradient_calculation, Array1<int>(), Array1<int>(), 2,
@@ -282,10 +276,12 @@ void AdSolver::Setup(const HdModule& hd, const HdSolver& hd_solver, const Mesh& 
 
 int AdSolver::SubStepCount(const AdFlow& flow, const AdComponent& comp) {
   // Rate r (1/s) of an element wet over the whole sub-step and deeper than
-  // h_min: the water leaving it and the dispersive conductance of its faces
-  // to wet neighbours over the volume it holds (the smaller of its start and
-  // end depths). The transport sub-step is CFL_critical_AD / max r, within
-  // dt_min_AD and dt_max_AD; the HD sub-step is split into n equal ones.
+  // h_min: the water leaving it and its dispersive conductance (its own
+  // coefficient over the faces to neighbours at its larger depth: exact for
+  // a uniform coefficient and depth) over the volume it holds (the smaller
+  // of its start and end depths). The transport sub-step is
+  // CFL_critical_AD / max r, within dt_min_AD and dt_max_AD; the HD
+  // sub-step is split into n equal ones.
   const HdSolver& hs = *hd_solver_;
   const double dt = flow.dt;
   const double* vol = flow.face_volume.data();
@@ -294,29 +290,22 @@ int AdSolver::SubStepCount(const AdFlow& flow, const AdComponent& comp) {
   const double* h1 = flow.h_end.data();
   const int* code0 = flow.wetdry.data();
   const int* code1 = flow.wetdry_end.data();
+  const double* conductance = element_conductance_.data();
   const double h_min = technique_.h_min;
   const int* slots = hs.slot_face_side.data();
-  const int* across = slot_neighbour_.data();
-  const double* conduct = slot_conductance_.data();
   const int planes = hs.face_planes, stride = hs.plane_stride;
   double rmax = 0.0;
   VHD_OMP_PARALLEL_FOR_REDUCTION(max, rmax)
   for (int e = 1; e <= nowned_; ++e) {
-    cfl_[e] = 0.0;
     const double h = std::min(h0[e], h1[e]);
-    if (code0[e] != kWet || code1[e] != kWet || !(h > h_min)) continue;
-    double out = 0.0, conductance = 0.0;
+    double out = 0.0;
     for (int j = 0; j < planes; ++j) {
-      const int k = j * stride + e;
-      const int m = slots[k];
-      const double leaving = (m & 1) ? -vol[m >> 1] : vol[m >> 1];
-      out += std::max(0.0, leaving);
-      const int nb = across[k];
-      if (D && nb > 0 && code0[nb] == kWet)
-        conductance += FaceDispersion(D[e], D[nb]) * 0.5 * (std::max(h0[e], h1[e]) + std::max(h0[nb], h1[nb])) *
-                       conduct[k];
+      const int m = slots[j * stride + e];
+      out += std::max(0.0, (m & 1) ? -vol[m >> 1] : vol[m >> 1]);
     }
-    const double rate = (out / dt + conductance) / (area_[e] * h);
+    const double dispersive = D ? D[e] * conductance[e] * std::max(h0[e], h1[e]) : 0.0;
+    const bool counted = code0[e] == kWet && code1[e] == kWet && h > h_min;
+    const double rate = counted ? (out / dt + dispersive) / (area_[e] * h) : 0.0;
     cfl_[e] = rate;
     rmax = std::max(rmax, rate);
   }

@@ -248,10 +248,7 @@ class AdSolver {
   Array1<double> face_idn_, face_tx_, face_ty_;
   Array1<double> face_ox1_, face_oy1_, face_ox2_, face_oy2_;
 
-  // Per element slot of the HD solver's face planes: the element across
-  // (0: none) and the face length over the normal centre distance.
-  Array1<int> slot_neighbour_;
-  Array1<double> slot_conductance_;
+  Array1<double> element_conductance_;  // per element: sum of L / (d.n) over its faces to neighbours (1)
 
   GradientStencil stencil_;
   LimiterGeometry2D limiter_geometry_;
