@@ -538,6 +538,9 @@ void AdSolver::UpdateElements(const AdFlow& flow, AdComponent& comp, double alph
   const double k_const = comp.decay_constant;
   const double* k_field = comp.decay.empty() ? nullptr : comp.decay.data();
   const double lo = comp.minimum, hi = comp.maximum, h_min = technique_.h_min;
+  // A stage of weight 0 (the first of the midpoint scheme) does not enter
+  // the budgets.
+  const bool book = weight != 0.0, book_decay = book && (k_field || k_const != 0.0);
   double* c = comp.c.data();
   VHD_OMP_PARALLEL_FOR
   for (int e = 1; e <= nowned_; ++e) {
@@ -561,8 +564,8 @@ void AdSolver::UpdateElements(const AdFlow& flow, AdComponent& comp, double alph
     const double h = alpha * h_base_[e] + (1.0 - alpha) * h_[e] + w * water_rate_[e];
     // The clamp acts where the element has a concentration (h > h_min).
     const double mc = h > h_min ? std::min(std::max(m, lo * h), hi * h) : m;
-    decay_step_[e] += weight * (pre - m) * A;
-    clamp_step_[e] += weight * (mc - m) * A;
+    if (book_decay) decay_step_[e] += weight * (pre - m) * A;
+    if (book) clamp_step_[e] += weight * (mc - m) * A;
     m_[e] = mc;
     h_[e] = h;
     if (h > h_min) c[e] = mc / h;
