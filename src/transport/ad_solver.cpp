@@ -603,6 +603,7 @@ int AdSolver::Step(const AdFlow& flow, AdComponent& comp) {
     }
   }
 
+  VHD_OMP_PARALLEL_FOR
   for (int e = 1; e <= nowned_; ++e) {
     comp.clamp_correction[e] = clamp_step_[e];
     comp.clamp_total[e] += clamp_step_[e];
