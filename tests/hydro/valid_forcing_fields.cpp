@@ -14,6 +14,7 @@
 #include "io/units.hpp"
 #include "io/zrn.hpp"
 #include "mesh/femdata.hpp"
+#include "bound_support.hpp"
 #include "sw_case.hpp"
 #include "test_support.hpp"
 
@@ -375,6 +376,53 @@ TEST(RadiationStress, LinearGradientSetsUpTheSurface) {
       EXPECT_NEAR(fitted / slope, 1.0, 0.02) << fitted << " " << slope;
     }
   }
+}
+
+// A basin 2 km by 4 km, 10 m deep, open to the west through a level
+// boundary held at the datum, under a uniform radiation-stress force along
+// the boundary (north, F = rho0 g h s). With the boundary's radiation
+// correction the level along the boundary tilts with the force and the
+// water settles nearly at rest with the slope s; without it the flat
+// boundary level drives a circulation through the boundary (mean speed
+// 0.07 m/s after 4000 s, against 4e-4 m/s with it after 24000 s).
+TEST(RadiationStress, LevelBoundaryTiltsWithTheForce) {
+  const double s = 1e-5;
+  double mean_speed[2] = {0.0, 0.0};
+  for (int correction : {1, 0}) {
+    SCOPED_TRACE(correction);
+    BoundCase b;
+    RectangleMeshSpec spec = Channel(10, 20, 200.0, 200.0, Flat(10.0), 2, 1);
+    spec.layout = CellLayout::kMixed;
+    b.Make(spec, 600.0, 40,
+           CodeSection(2, "type = 6\nconstant_value = 0.0\ntype_of_soft_start = 0\n"
+                          "type_of_radiation_stress_correction = " + std::to_string(correction) + "\n"));
+    SwCase& c = b.c;
+    SetScheme(c.hd, 1, 2);
+    c.hd.bed.type = kBedDragCoefficient;
+    c.hd.bed.K.assign(c.hd.state.nelements, 0.003);
+    HdRadiationStress& rs = c.hd.forcing.radiation;
+    rs.type = 3;
+    rs.data.type_of_soft_start = kSoftStartSine;
+    rs.data.soft_time_interval = 6000.0;
+    ElementMap(c, rs.data, b.dir.file("force.zrnu"), 2, {0.0, 24000.0},
+               [&](int k, int, double, double) { return k == 2 ? kPhysical.rho0 * g * 10.0 * s : 0.0; });
+    b.Start([](double, double) { return 0.0; });
+    RunTo(c, correction == 1 ? 24000.0 : 4000.0);
+    ASSERT_EQ(c.run_status, 0);
+    const HdState& st = c.hd.state;
+    double m = 0, sy = 0, se = 0, syy = 0, sye = 0;
+    for (int e = 1; e <= st.nelements; ++e) {
+      const double y = c.mesh.elements.yc[e];
+      mean_speed[correction] += std::hypot(st.u[e], st.v[e]) / st.nelements;
+      m += 1, sy += y, se += st.eta[e], syy += y * y, sye += y * st.eta[e];
+    }
+    if (correction == 1) {
+      const double fitted = (m * sye - sy * se) / (m * syy - sy * sy);
+      EXPECT_NEAR(fitted / s, 1.0, 0.02) << fitted;
+    }
+  }
+  EXPECT_LT(mean_speed[1], 1e-3);
+  EXPECT_GT(mean_speed[0], 50.0 * mean_speed[1]) << mean_speed[0] << " " << mean_speed[1];
 }
 
 // Depth correction, ice and radiation stress over a sloping beach give the
