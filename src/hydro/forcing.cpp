@@ -250,8 +250,16 @@ void UPDATEWIND(HdModule& hd, double t) {
   w.soft = s;
   if (w.format != 3) {
     const bool constant = w.format == 0;
-    const double speed = s * (constant ? w.constant_speed : FemDataValue(w.data, 1, t));
-    const double direction = constant ? w.constant_direction : FemDataValue(w.data, 2, t);
+    double speed_read = constant ? w.constant_speed : FemDataValue(w.data, 1, t);
+    double direction = constant ? w.constant_direction : FemDataValue(w.data, 2, t);
+    // A series without a value at t (its delete value, or a step pair with
+    // one) gives calm air, as a map does: the delete value is no wind.
+    const double del = w.data.state.open ? w.data.state.file.delete_value : kZrnDefaultDeleteValue;
+    if (!constant && (!MapValueGiven(speed_read, del) || !MapValueGiven(direction, del))) {
+      speed_read = 0.0;
+      direction = 0.0;
+    }
+    const double speed = s * speed_read;
     WindComponentsHD(speed, direction, w.u, w.v);
     w.stress_factor = WindFrictionHD(w, speed) / kWaterOverAirDensity * speed;
     return;

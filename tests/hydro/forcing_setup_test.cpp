@@ -86,6 +86,42 @@ TEST(ForcingSetup, WindSeriesInterpolatesTheDirectionThroughNorth) {
   EXPECT_NEAR(f.hd.forcing.wind.v, -15.0, 1e-12);
 }
 
+// A series step without a speed (the file's delete value, here -999) gives
+// calm air while it brackets the time, not a wind of -999 m/s; the wind
+// returns with the next complete pair of steps.
+TEST(ForcingSetup, WindSeriesWithoutAValueIsCalm) {
+  HdSetupFixture f;
+  ZrnFile z;
+  ASSERT_EQ(zrnHeaderCreate(z, f.dir.file("wind.zrn0"), kZrnFileData, "wind"), 0);
+  ASSERT_EQ(zrnSetEqCalendarAxis(z, zrnDateTime(f.time.start), 3600.0), 0);
+  ASSERT_EQ(zrnSetDeleteValFloat(z, -999.0), 0);
+  for (int k = 1; k <= 2; ++k) {
+    ASSERT_EQ(zrnSetItemInfo(z, k, k == 1 ? "Speed" : "Direction", kUvqItemUndefined, kUvqUnitUndefined, kZrnDouble),
+              0);
+    ASSERT_EQ(zrnSetItemAxisEqD0(z, k), 0);
+  }
+  ASSERT_EQ(zrnFileCreate(z), 0);
+  const double values[4][2] = {{10.0, 0.0}, {-999.0, 0.0}, {20.0, -999.0}, {12.0, 90.0}};
+  for (const auto& step : values) {
+    for (double v : step) ASSERT_EQ(zrnWriteItemTimeStep(z, 0.0, &v, 1), 0);
+  }
+  ASSERT_EQ(zrnFileClose(z), 0);
+  HdSolver s;
+  f.time.last_step = 360;
+  SetupWithSolver(f, kHd + HdSection("WIND_FORCING", "type = 1\nformat = 1\nfile_name = \"wind.zrn0\"\n"),
+                  MakeMesh(3, 3, 10.0, 10.0, test::Flat(2.0)), s);
+  struct Case {
+    double t, u, v;
+  } cases[] = {{0.0, 0.0, -10.0}, {1800.0, 0.0, 0.0}, {5400.0, 0.0, 0.0}, {9000.0, 0.0, 0.0}, {10800.0, -12.0, 0.0}};
+  for (const Case& c : cases) {
+    UpdateForcingHD(f.hd, s, f.meshes[0], c.t, 30.0);
+    EXPECT_NEAR(f.hd.forcing.wind.u, c.u, 1e-12) << c.t;
+    EXPECT_NEAR(f.hd.forcing.wind.v, c.v, 1e-12) << c.t;
+    EXPECT_EQ(f.hd.boundary.forcing.wind_x[5] == 0.0 && f.hd.boundary.forcing.wind_y[5] == 0.0, c.u == 0 && c.v == 0)
+        << c.t;
+  }
+}
+
 TEST(ForcingSetup, SoftStartGrowsTheWindAndMovesThePressure) {
   HdModule hd;
   HdWindForcing& w = hd.forcing.wind;
