@@ -6,6 +6,7 @@
 #include <array>
 #include <cmath>
 #include <string>
+#include <vector>
 
 #include "hydro/forcing.hpp"
 #include "hydro/hd_module.hpp"

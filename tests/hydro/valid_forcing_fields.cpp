@@ -26,7 +26,8 @@ constexpr double g = 9.81;
 // A map file on the case's mesh with nitems element items and steps at
 // times[0], times[1], ... (seconds from the case's start, 2004-01-01):
 // value(item, step, x, y). The case's time axis is set to end at the last
-// step, and spec is opened on the elements with the items 1 .. nitems.
+// step, and the input definition is opened on the elements with the items
+// 1 .. nitems.
 void ElementMap(SwCase& c, DataSpec& spec, const std::string& path, int nitems, const std::vector<double>& times,
                 const std::function<double(int, int, double, double)>& value) {
   const Mesh& mesh = c.mesh;
