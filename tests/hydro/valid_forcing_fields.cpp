@@ -23,6 +23,14 @@ namespace {
 
 constexpr double g = 9.81;
 
+// File name stem + n + ".zrnu".
+std::string MapName(const char* stem, int n) {
+  std::string name(stem);
+  name += std::to_string(n);
+  name += ".zrnu";
+  return name;
+}
+
 // A map file on the case's mesh with nitems element items and steps at
 // times[0], times[1], ... (seconds from the case's start, 2004-01-01):
 // value(item, step, x, y). The case's time axis is set to end at the last
@@ -133,7 +141,7 @@ TEST(DepthCorrection, UniformRiseKeepsTheLakeAtRest) {
     LakeWithBump(c, lo.layout, lo.order);
     HdDepthCorrection& dc = c.hd.forcing.depth;
     dc.type = 1;
-    ElementMap(c, dc.data, dir.file("k" + std::to_string(n++) + ".zrnu"), 1, {0.0, 2000.0},
+    ElementMap(c, dc.data, dir.file(MapName("k", n++)), 1, {0.0, 2000.0},
                [](int, int step, double, double) { return 0.5 * step; });
     StartCase(c, [](double, double) { return 0.01; });
     RunTo(c, 2000.0);
@@ -168,7 +176,7 @@ TEST(DepthCorrection, SurfaceSettlesAtTheLevelOfTheCorrectedBed) {
     HdDepthCorrection& dc = c.hd.forcing.depth;
     dc.type = 1;
     auto k = [](double x) { return 0.3 * std::exp(-(x - 6000.0) * (x - 6000.0) / (1500.0 * 1500.0)); };
-    ElementMap(c, dc.data, dir.file("bump" + std::to_string(n++) + ".zrnu"), 1, {0.0, 12000.0, 24000.0},
+    ElementMap(c, dc.data, dir.file(MapName("bump", n++)), 1, {0.0, 12000.0, 24000.0},
                [&](int, int step, double x, double) { return step == 0 ? 0.0 : k(x); });
     StartCase(c, [](double, double) { return 0.0; });
     const double v0 = Volume(c);
@@ -329,7 +337,7 @@ TEST(RadiationStress, UniformStressesGiveNoForce) {
     LakeWithBump(c, lo.layout, lo.order);
     HdRadiationStress& rs = c.hd.forcing.radiation;
     rs.type = 1;
-    ElementMap(c, rs.data, dir.file("s" + std::to_string(n++) + ".zrnu"), 3, {0.0, 1000.0},
+    ElementMap(c, rs.data, dir.file(MapName("s", n++)), 3, {0.0, 1000.0},
                [](int k, int, double, double) { return k == 2 ? -350.0 : 1200.0; });
     StartCase(c, [](double, double) { return 0.01; });
     RunTo(c, 1000.0);
@@ -359,7 +367,7 @@ TEST(RadiationStress, LinearGradientSetsUpTheSurface) {
       rs.type = type;
       rs.data.type_of_soft_start = kSoftStartSine;
       rs.data.soft_time_interval = 12000.0;
-      ElementMap(c, rs.data, dir.file("g" + std::to_string(n++) + ".zrnu"), type == 1 ? 3 : 2, {0.0, 30000.0},
+      ElementMap(c, rs.data, dir.file(MapName("g", n++)), type == 1 ? 3 : 2, {0.0, 30000.0},
                  [&](int k, int, double x, double) {
                    if (type == 3) return k == 1 ? -gradient : 0.0;
                    return k == 1 ? 1000.0 + gradient * x : k == 2 ? 50.0 : 400.0;
@@ -452,11 +460,11 @@ TEST(ForcingFieldsThreads, SameBitsOnOneAndTwoThreads) {
     ice.roughness.values.assign(c->hd.state.nelements, 0.05);
     HdDepthCorrection& dc = c->hd.forcing.depth;
     dc.type = 1;
-    ElementMap(*c, dc.data, dir.file("k" + std::to_string(threads) + ".zrnu"), 1, {0.0, 300.0},
+    ElementMap(*c, dc.data, dir.file(MapName("k", threads)), 1, {0.0, 300.0},
                [](int, int step, double x, double y) { return 0.1 * step * std::sin(x / 300.0 + y / 200.0); });
     HdRadiationStress& rs = c->hd.forcing.radiation;
     rs.type = 1;
-    ElementMap(*c, rs.data, dir.file("s" + std::to_string(threads) + ".zrnu"), 3, {0.0, 300.0},
+    ElementMap(*c, rs.data, dir.file(MapName("s", threads)), 3, {0.0, 300.0},
                [](int k, int, double x, double y) { return k * 100.0 * std::cos(x / 500.0 - y / 400.0); });
     StartCase(*c, [](double, double) { return 0.0; });
     OmpSetThreads(threads);
