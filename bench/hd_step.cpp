@@ -18,14 +18,16 @@
 #include <memory>
 #include <vector>
 
-#include "core/omp.hpp"
 #include "hd_case.hpp"
+#include "core/omp.hpp"
+#include "hydro/hd_module.hpp"
+#include "hydro/time_step.hpp"
 #include "log/log.hpp"
+#include "mesh/mesh.hpp"
 
 namespace {
 
 using namespace vhd;
-using bench::MakeCase;
 
 // Triad a = b + s c over arrays far larger than the caches (GB/s, counting
 // 3 x 8 bytes per entry).
@@ -56,7 +58,7 @@ void BM_HdStep(benchmark::State& state) {
   const int threads = static_cast<int>(state.range(2));
   OmpSetThreads(threads);
   const double triad = TriadBandwidth();
-  auto c = MakeCase(elements, order);
+  auto c = bench::MakeHdCase(elements, order);
   int status = 0;
   double t = 0;
   const std::clock_t cpu0 = std::clock();  // CPU time of every thread of the process

@@ -32,7 +32,7 @@ void BM_Transport(benchmark::State& state) {
   const int scheme = static_cast<int>(state.range(1));
   const int threads = static_cast<int>(state.range(2));
   OmpSetThreads(threads);
-  auto c = bench::MakeCase(elements, 2);
+  auto c = bench::MakeHdCase(elements, 2);
   AdSolutionTechnique technique;
   technique.scheme_of_time_integration = scheme;
   technique.scheme_of_space_discretization_horizontal = 2;
