@@ -74,12 +74,11 @@ BED_LEVEL_CHANGE = true
 [VantorHD.SAND_TRANSPORT_MODULE.OUTPUTS.OUTPUT_2]
 file_name = "sand_points.zrn0"
 format = 0
-interpolation_type = 2
 number_of_points = 1
 [VantorHD.SAND_TRANSPORT_MODULE.OUTPUTS.OUTPUT_2.POINT_1]
 name = "mound"
-x = 500700.0
-y = 6000150.0
+x = 500720.0
+y = 6000160.0
 [VantorHD.SAND_TRANSPORT_MODULE.OUTPUTS.OUTPUT_2.PARAMETERS_2D]
 BED_LEVEL_CHANGE = true
 SETUP
