@@ -15,11 +15,12 @@ void ApplyBedChangeHD(HdModule& hd, const Mesh& mesh, Array1<double>& dz) {
     s.d[e] -= dz[e];
     if (s.wetdry[e] > 0) {
       s.h[e] = s.eta[e] + s.d[e];
-      if (s.h[e] < 0.0) {
+      if (s.h[e] <= 0.0) {
         s.h[e] = 0.0;
         s.eta[e] = -s.d[e];
         s.P[e] = 0.0;
         s.Q[e] = 0.0;
+        s.wetdry[e] = kDry;
       }
     } else {
       s.eta[e] = s.h[e] - s.d[e];

@@ -3,8 +3,9 @@
 //
 // The bed of element e rises by dz[e] (m): the still water depth d falls by
 // dz. In an element holding water (code > 0) the surface elevation stays and
-// the depth follows, h = eta + d (cut at 0, where the surface then lies on
-// the bed and the fluxes are 0); in a dry element (code 0) the depth stays
+// the depth follows, h = eta + d; where the bed rises through the surface
+// the element falls dry (h = 0, the surface on the bed, fluxes 0, code 0,
+// so that no neighbour reconstructs a surface from it); in a dry element (code 0) the depth stays
 // and the surface moves with the bed. The fluxes P, Q stay, the velocities
 // are formed again from them. So a lake at rest stays at rest over any
 // change of its bed, and the water volume changes by the bed volume raised
