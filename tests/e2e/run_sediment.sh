@@ -3,18 +3,28 @@
 # Mueller, helical flow, morphological factor 200) moves the bed. The runs on
 # 1 and 2 processes and on 2 threads give the same bits in every output
 # (flow and sand), and the log holds the module's sections and statistics.
-# Skipped without mpirun.
+# A sand module without the flow is refused. The process comparison is
+# skipped without mpirun.
 . ./driver_common.inc
 export TANO_PROGRESS=NONE
 export OMPI_MCA_mpi_yield_when_idle=1
 PY=/usr/bin/python3
 
+. ./processes_common.inc
+
+e=$(case_dir no_flow)
+write_slope "$e" closed
+sed -i 's/^mode_of_hydrodynamic_module = 2/mode_of_hydrodynamic_module = 0\nmode_of_sand_transport_module = 2/' \
+  "$e/setup.toml"
+timeout 600 "$VANTORHD" "$e/setup.toml" > "$e/out" 2>&1
+status_is 1 $? "$e"
+contains "$e/setup.log" "Fatal error: The Hydrodynnamic module must be included"
+
 if ! command -v mpirun > /dev/null 2>&1; then
   echo "mpirun not found: skipped"
+  finish
   exit 0
 fi
-
-. ./processes_common.inc
 
 d=$(case_dir sand)
 write_slope "$d" open
