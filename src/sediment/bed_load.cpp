@@ -18,6 +18,11 @@ constexpr int kEngelundFredsoeIterations = 100;
 
 double CriticalWithSlope(double theta_c, double sl) { return std::max(kBedLoadShieldsFloor, (1.0 + sl) * theta_c); }
 
+// x^1.5 and x^2.5 through the square root (within an ulp of pow, at a
+// fraction of its cost).
+double Pow15(double x) { return x * std::sqrt(x); }
+double Pow25(double x) { return x * x * std::sqrt(x); }
+
 }  // namespace
 
 double DimensionlessGrainSize(double d, double relative_density) {
@@ -55,7 +60,7 @@ double BedLoadMagnitude(const BedLoadSettings& s, double speed, double f, double
   switch (s.formula) {
     case kBedLoadEngelundHansen: {
       if (!(theta > CriticalWithSlope(s.critical_shields, sl))) return 0.0;
-      return Single(0.05f) * d * sqrt_a * std::pow(theta, 2.5) / f;
+      return Single(0.05f) * d * sqrt_a * Pow25(theta) / f;
     }
     case kBedLoadVanRijn: {
       const double dstar = DimensionlessGrainSize(d, s.relative_density);
@@ -83,7 +88,7 @@ double BedLoadMagnitude(const BedLoadSettings& s, double speed, double f, double
       if (!(theta > theta_ce)) return 0.0;
       const double theta_skin = std::min(theta, Single(0.06f) + Single(0.4f) * theta * theta);
       if (!(theta_skin > theta_ce)) return 0.0;
-      return 8.0 * d * sqrt_a * std::pow(theta_skin - theta_ce, 1.5);
+      return 8.0 * d * sqrt_a * Pow15(theta_skin - theta_ce);
     }
     default:
       return 0.0;
@@ -101,7 +106,9 @@ void BedLoadElement(const BedLoadSettings& s, int wet, double u, double v, doubl
   if (!(q > 0.0)) return;
   const double theta = f * speed2 / ((s.relative_density - 1.0) * kBedLoadGravity * d);
   const double qs = std::max(0.0, 1.0 - s.streamwise_slope_factor * sl) * q;
-  const double phi = std::pow(std::min(theta, Single(0.06f) + Single(0.4f) * theta), s.transverse_slope_exponent);
+  const double base = std::min(theta, Single(0.06f) + Single(0.4f) * theta);
+  const double m = s.transverse_slope_exponent;
+  const double phi = m == 0.5 ? std::sqrt(base) : std::pow(base, m);
   const double qn = (tan_delta - s.transverse_slope_factor * st / phi) * q;
   qx = s.factor * (u * qs - v * qn) / speed;
   qy = s.factor * (v * qs + u * qn) / speed;
