@@ -53,9 +53,24 @@ double EngelundFredsoeSkinShields(double speed, double h, double d, double a, do
   return theta_skin;
 }
 
+BedLoadGrain BedLoadGrainOf(double d, double relative_density) {
+  BedLoadGrain g;
+  g.d = d;
+  g.a = (relative_density - 1.0) * kBedLoadGravity * d;
+  g.sqrt_a = std::sqrt(g.a);
+  g.dstar = DimensionlessGrainSize(d, relative_density);
+  g.van_rijn_critical = VanRijnCriticalShields(g.dstar);
+  g.dstar_power = std::pow(g.dstar, Single(0.3f));
+  return g;
+}
+
 double BedLoadMagnitude(const BedLoadSettings& s, double speed, double f, double h, double d, double sl) {
-  const double a = (s.relative_density - 1.0) * kBedLoadGravity * d;
-  const double sqrt_a = std::sqrt(a);
+  return BedLoadMagnitude(s, BedLoadGrainOf(d, s.relative_density), speed, f, h, sl);
+}
+
+double BedLoadMagnitude(const BedLoadSettings& s, const BedLoadGrain& grain, double speed, double f, double h,
+                        double sl) {
+  const double d = grain.d, a = grain.a, sqrt_a = grain.sqrt_a;
   const double theta = f * speed * speed / a;
   switch (s.formula) {
     case kBedLoadEngelundHansen: {
@@ -63,8 +78,7 @@ double BedLoadMagnitude(const BedLoadSettings& s, double speed, double f, double
       return Single(0.05f) * d * sqrt_a * Pow25(theta) / f;
     }
     case kBedLoadVanRijn: {
-      const double dstar = DimensionlessGrainSize(d, s.relative_density);
-      const double theta_ce = CriticalWithSlope(VanRijnCriticalShields(dstar), sl);
+      const double theta_ce = CriticalWithSlope(grain.van_rijn_critical, sl);
       if (!(theta > theta_ce)) return 0.0;
       const double cg = 18.0 * std::log10(2.0 * h / d);
       if (!(cg > 0.0)) return 0.0;
@@ -73,7 +87,7 @@ double BedLoadMagnitude(const BedLoadSettings& s, double speed, double f, double
       const double ratio = ustar_skin / ustar_c;
       const double t = ratio * ratio - 1.0;
       if (!(t > 0.0)) return 0.0;
-      return Single(0.053f) * sqrt_a * d * std::pow(t, Single(2.1f)) / std::pow(dstar, Single(0.3f));
+      return Single(0.053f) * sqrt_a * d * std::pow(t, Single(2.1f)) / grain.dstar_power;
     }
     case kBedLoadEngelundFredsoe: {
       if (!(theta > CriticalWithSlope(s.critical_shields, sl))) return 0.0;
@@ -97,14 +111,19 @@ double BedLoadMagnitude(const BedLoadSettings& s, double speed, double f, double
 
 void BedLoadElement(const BedLoadSettings& s, int wet, double u, double v, double f, double h, double d,
                     double sl, double st, double tan_delta, double& qx, double& qy) {
+  BedLoadElement(s, wet, u, v, f, h, BedLoadGrainOf(d, s.relative_density), sl, st, tan_delta, qx, qy);
+}
+
+void BedLoadElement(const BedLoadSettings& s, int wet, double u, double v, double f, double h,
+                    const BedLoadGrain& grain, double sl, double st, double tan_delta, double& qx, double& qy) {
   qx = 0.0;
   qy = 0.0;
   const double speed2 = u * u + v * v;
   if (wet < 1 || !(speed2 > kBedLoadSpeedSquaredFloor)) return;
   const double speed = std::sqrt(speed2);
-  const double q = BedLoadMagnitude(s, speed, f, h, d, sl);
+  const double q = BedLoadMagnitude(s, grain, speed, f, h, sl);
   if (!(q > 0.0)) return;
-  const double theta = f * speed2 / ((s.relative_density - 1.0) * kBedLoadGravity * d);
+  const double theta = f * speed2 / grain.a;
   const double qs = std::max(0.0, 1.0 - s.streamwise_slope_factor * sl) * q;
   const double base = std::min(theta, Single(0.06f) + Single(0.4f) * theta);
   const double m = s.transverse_slope_exponent;
@@ -120,8 +139,8 @@ void CALCBEDLOADCURRENT(const BedLoadSettings& s, const BedLoadInputs& in, int n
   double* qy_data = qy.data();
   VHD_OMP_PARALLEL_FOR
   for (int e = 1; e <= n; ++e) {
-    const double d = in.grain_diameter ? in.grain_diameter[e] : in.grain_constant;
-    BedLoadElement(s, in.wet[e], in.u[e], in.v[e], in.friction[e], in.depth[e], d, in.streamwise_slope[e],
+    const BedLoadGrain& grain = in.grain ? in.grain[e] : in.grain_constant;
+    BedLoadElement(s, in.wet[e], in.u[e], in.v[e], in.friction[e], in.depth[e], grain, in.streamwise_slope[e],
                    in.transverse_slope[e], in.tan_delta[e], qx_data[e], qy_data[e]);
   }
 }

@@ -60,16 +60,28 @@ struct BedLoadSettings {
   double relative_density = 2.65;           // s
 };
 
+// The terms of a grain diameter d that do not change in time: a = (s - 1) g d,
+// sqrt(a), van Rijn's D*, its critical Shields parameter and D*^0.3.
+struct BedLoadGrain {
+  double d = 0.0;
+  double a = 0.0;
+  double sqrt_a = 0.0;
+  double dstar = 0.0;
+  double van_rijn_critical = 0.0;
+  double dstar_power = 0.0;
+};
+BedLoadGrain BedLoadGrainOf(double d, double relative_density);
+
 // Per-element inputs of CALCBEDLOADCURRENT (arrays over the elements, from 1).
-// grain_diameter may be null: every element then has grain_constant.
+// grain may be null: every element then has grain_constant.
 struct BedLoadInputs {
   const int* wet = nullptr;           // wet/dry code: transport where >= 1
   const double* u = nullptr;          // m/s
   const double* v = nullptr;          // m/s
   const double* friction = nullptr;   // f, u*^2 = f |U|^2
   const double* depth = nullptr;      // h (m)
-  const double* grain_diameter = nullptr;  // d (m)
-  double grain_constant = 0.0;        // d (m) where grain_diameter is null
+  const BedLoadGrain* grain = nullptr;  // terms of the grain diameter d
+  BedLoadGrain grain_constant;          // where grain is null
   const double* streamwise_slope = nullptr;  // sl, positive rising along the flow
   const double* transverse_slope = nullptr;  // st, positive rising to the left of the flow
   const double* tan_delta = nullptr;  // helical flow, positive turning the transport left
@@ -87,9 +99,13 @@ double EngelundFredsoeSkinShields(double speed, double h, double d, double a, do
 
 // Magnitude q of the bed load along the flow (m2/s), before the corrections;
 // sl raises the critical value.
+double BedLoadMagnitude(const BedLoadSettings& s, const BedLoadGrain& grain, double speed, double f, double h,
+                        double sl);
 double BedLoadMagnitude(const BedLoadSettings& s, double speed, double f, double h, double d, double sl);
 
 // Bed load (qx, qy) of one element.
+void BedLoadElement(const BedLoadSettings& s, int wet, double u, double v, double f, double h,
+                    const BedLoadGrain& grain, double sl, double st, double tan_delta, double& qx, double& qy);
 void BedLoadElement(const BedLoadSettings& s, int wet, double u, double v, double f, double h, double d,
                     double sl, double st, double tan_delta, double& qx, double& qy);
 

@@ -73,6 +73,10 @@ struct StModule {
 
   // Per element.
   Array1<double> grain;                   // grain diameter (m)
+  // Terms of the grain diameter for the bed load: one for a constant
+  // diameter, else per element.
+  BedLoadGrain grain_terms_constant;
+  Array1<BedLoadGrain> grain_terms;
   Array1<double> qx, qy;                  // bed load (m2/s)
   Array1<double> sl, st, tan_delta;       // inputs of the bed load
   Array1<double> bed, bed_x, bed_y;       // bed level (m) and its gradient

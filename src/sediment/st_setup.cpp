@@ -128,6 +128,12 @@ void AllocateST(StModule& st, const HdModule& hd, const Mesh& mesh) {
                             &st.bed_change, &st.area})
     a->assign(ne, 0.0);
   if (st.grain.size() != ne) st.grain.assign(ne, st.grain_diameter);
+  const double density = st.bed_load.relative_density;
+  st.grain_terms_constant = BedLoadGrainOf(st.grain_diameter, density);
+  if (st.grain_format == 2) {
+    st.grain_terms.assign(ne, BedLoadGrain{});
+    for (int e = 1; e <= ne; ++e) st.grain_terms[e] = BedLoadGrainOf(st.grain[e], density);
+  }
   if (st.helical_flow == 1)
     for (Array1<double>* a : {&st.ux, &st.uy, &st.vx, &st.vy}) a->assign(ne, 0.0);
   for (int e = 1; e <= ne; ++e) st.area[e] = mesh.elements.area[e];

@@ -52,7 +52,8 @@ void CalcBedLoadST(StModule& st, const HdModule& hd) {
   in.v = s.v.data();
   in.friction = s.cf.data();
   in.depth = s.h.data();
-  in.grain_diameter = st.grain.data();
+  in.grain = st.grain_format == 2 ? st.grain_terms.data() : nullptr;
+  in.grain_constant = st.grain_terms_constant;
   in.streamwise_slope = st.sl.data();
   in.transverse_slope = st.st.data();
   in.tan_delta = st.tan_delta.data();

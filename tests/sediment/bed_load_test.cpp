@@ -319,11 +319,21 @@ TEST(BedLoad, ElementLoopIsTheElementFormulaOnOneAndTwoThreads) {
     st[e] = 0.05 * std::cos(0.2 * e);
     td[e] = 0.1 * std::sin(0.05 * e);
   }
-  BedLoadInputs in{wet.data(), u.data(), v.data(), f.data(), h.data(), d.data(), 0.0,
-                   sl.data(),  st.data(), td.data()};
   for (int formula = 1; formula <= 4; ++formula) {
     BedLoadSettings s;
     s.formula = formula;
+    std::vector<BedLoadGrain> grain(n + 1);
+    for (int e = 1; e <= n; ++e) grain[e] = BedLoadGrainOf(d[e], s.relative_density);
+    BedLoadInputs in;
+    in.wet = wet.data();
+    in.u = u.data();
+    in.v = v.data();
+    in.friction = f.data();
+    in.depth = h.data();
+    in.grain = grain.data();
+    in.streamwise_slope = sl.data();
+    in.transverse_slope = st.data();
+    in.tan_delta = td.data();
     Array1<double> qx1, qy1, qx2, qy2;
     qx1.assign(n, 0.0), qy1.assign(n, 0.0), qx2.assign(n, 0.0), qy2.assign(n, 0.0);
     OmpSetThreads(1);
