@@ -7,7 +7,8 @@
 // Counters: Melem_per_s (elements / wall-clock s). The ratio of the two times
 // per sub-step is the share the sand adds to the flow (bench/README.md).
 //
-// The sand step runs on the case's state after one HD step, with a current
+// The sand step (helical flow off or on) runs on the case's state after one
+// HD step, with a current
 // of 0.3 to 0.9 m/s set in it, a drag coefficient of 0.02 (the case's bed
 // resistance is off) and a grain diameter of 0.1 mm, so that the sand moves
 // in every element and each formula runs its full path (moving_share).
@@ -43,7 +44,7 @@ void BM_HdStepOrder2(benchmark::State& state) {
 }
 
 void BM_SandStep(benchmark::State& state) {
-  OmpSetThreads(static_cast<int>(state.range(2)));
+  OmpSetThreads(static_cast<int>(state.range(3)));
   auto c = bench::MakeHdCase(static_cast<int>(state.range(0)), 2);
   int status = 0;
   const double dt = CALCTIMESTEPHD(c->hd, c->solver, c->mesh, 0.0, 1e9);
@@ -61,7 +62,7 @@ void BM_SandStep(benchmark::State& state) {
   StModule st;
   st.bed_load.formula = static_cast<int>(state.range(1));
   st.grain_diameter = 1e-4;
-  st.helical_flow = 1;
+  st.helical_flow = static_cast<int>(state.range(2));
   st.morphological_factor = 10.0;
   AllocateST(st, c->hd, c->mesh);
   SetupTimingST(st);
@@ -87,13 +88,13 @@ BENCHMARK(BM_HdStepOrder2)
     ->MinTime(2.0);
 
 BENCHMARK(BM_SandStep)
-    ->ArgNames({"elements", "formula", "threads"})
-    ->Args({1'000'000, 1, 1})
-    ->Args({1'000'000, 2, 1})
-    ->Args({1'000'000, 3, 1})
-    ->Args({1'000'000, 4, 1})
-    ->Args({1'000'000, 3, 2})
-    ->Args({1'000'000, 4, 2})
+    ->ArgNames({"elements", "formula", "helical", "threads"})
+    ->Args({1'000'000, 1, 0, 1})
+    ->Args({1'000'000, 2, 0, 1})
+    ->Args({1'000'000, 3, 0, 1})
+    ->Args({1'000'000, 4, 0, 1})
+    ->Args({1'000'000, 4, 1, 1})
+    ->Args({1'000'000, 4, 0, 2})
     ->Unit(benchmark::kMillisecond)
     ->UseRealTime()
     ->MinTime(2.0);

@@ -79,7 +79,7 @@ struct StModule {
   Array1<BedLoadGrain> grain_terms;
   Array1<double> qx, qy;                  // bed load (m2/s)
   Array1<double> sl, st, tan_delta;       // inputs of the bed load
-  Array1<double> bed, bed_x, bed_y;       // bed level (m) and its gradient
+  Array1<double> depth_x, depth_y;        // gradient of the still water depth d
   Array1<double> ux, uy, vx, vy;          // velocity gradients (helical flow)
   Array1<double> dz;                      // bed change of the last update (m)
   Array1<double> bed_change;              // bed change since the start (m)

@@ -124,7 +124,7 @@ void AllocateST(StModule& st, const HdModule& hd, const Mesh& mesh) {
   st.nfaces = s.nfaces;
   st.subdomain = hd.subdomain;
   const int ne = st.nelements;
-  for (Array1<double>* a : {&st.qx, &st.qy, &st.sl, &st.st, &st.tan_delta, &st.bed, &st.bed_x, &st.bed_y, &st.dz,
+  for (Array1<double>* a : {&st.qx, &st.qy, &st.sl, &st.st, &st.tan_delta, &st.depth_x, &st.depth_y, &st.dz,
                             &st.bed_change, &st.area})
     a->assign(ne, 0.0);
   if (st.grain.size() != ne) st.grain.assign(ne, st.grain_diameter);

@@ -19,10 +19,9 @@ double StreamlineCurvature(double u, double v, double ux, double uy, double vx, 
 
 void CalcBedLoadInputsST(StModule& st, const HdModule& hd) {
   const HdState& s = hd.state;
-  const int nlocal = st.nlocal, nown = st.nowned;
-  VHD_OMP_PARALLEL_FOR
-  for (int e = 1; e <= nlocal; ++e) st.bed[e] = -s.d[e];
-  CALCGRADIENTELEMENT2D(st.stencil, st.bed, st.bed_x, st.bed_y);
+  const int nown = st.nowned;
+  // The bed level is -d: its gradient is minus that of d (exactly).
+  CALCGRADIENTELEMENT2D(st.stencil, s.d, st.depth_x, st.depth_y);
   const bool helical = st.helical_flow == 1;
   if (helical) CALCGRADIENTVELOCITYELEMENT2D(st.stencil, s.u, s.v, st.ux, st.uy, st.vx, st.vy);
   const double coefficient = st.helical_coefficient;
@@ -37,8 +36,9 @@ void CalcBedLoadInputsST(StModule& st, const HdModule& hd) {
       continue;
     }
     // Along the flow, and to its left (the normal (-v, u)).
-    st.sl[e] = (st.bed_x[e] * u + st.bed_y[e] * v) / speed;
-    st.st[e] = (st.bed_y[e] * u - st.bed_x[e] * v) / speed;
+    const double bx = -st.depth_x[e], by = -st.depth_y[e];
+    st.sl[e] = (bx * u + by * v) / speed;
+    st.st[e] = (by * u - bx * v) / speed;
     st.tan_delta[e] =
         helical ? coefficient * s.h[e] * StreamlineCurvature(u, v, st.ux[e], st.uy[e], st.vx[e], st.vy[e]) : 0.0;
   }
