@@ -27,6 +27,10 @@ class HdDriverModule final : public Module {
   double MeshSizeFigure() const override;
 
   const HdModule& hd() const { return hd_; }
+  // For a module that changes the flow state between HD steps (the sand
+  // transport moves the bed), and the mesh the state lives on.
+  HdModule& mutable_hd() { return hd_; }
+  const Mesh& mesh() const { return *mesh_; }
 
  private:
   HdModule hd_;

@@ -3,6 +3,7 @@
 
 #include "control/hd_driver_module.hpp"
 #include "control/module.hpp"
+#include "control/st_driver_module.hpp"
 #include "io/setup.hpp"
 #include "log/log.hpp"
 
@@ -54,6 +55,8 @@ std::unique_ptr<Module> CreateModule(ModuleKind kind, int /*mode*/) {
   switch (kind) {
     case ModuleKind::HD:
       return std::make_unique<HdDriverModule>();
+    case ModuleKind::ST:
+      return std::make_unique<StDriverModule>();
     default:
       return nullptr;
   }
@@ -84,7 +87,9 @@ void SetupModules(ModuleSet& modules, const ModuleContext& context) {
       FatalError("MODULE_SELECTION: " + std::string(ModuleModeKeyword(kind)) + " = " +
                  std::to_string(mode) + ": the " + std::string(ModuleTitle(kind)) +
                  " module is not available in this build");
-    module->Setup(context);
+    ModuleContext own = context;
+    own.modules = &modules;
+    module->Setup(own);
     modules.Set(kind, std::move(module));
   }
 }
