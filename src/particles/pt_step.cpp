@@ -60,6 +60,7 @@ int WalkPT(const PtModule& pt, const Array1<int>& wetdry, bool avoid_dry, int& e
     const int nf = ElementFaceCount(el, e);
     double t_exit = 2.0;
     int f_exit = 0;
+    Edge g_exit{};
     for (int j = 1; j <= nf; ++j) {
       const int f = ElementFace(el, e, j);
       const Edge g = MakeEdge(m, f, cx, cy);
@@ -71,10 +72,11 @@ int WalkPT(const PtModule& pt, const Array1<int>& wetdry, bool avoid_dry, int& e
       if (t < t_exit) {
         t_exit = t;
         f_exit = f;
+        g_exit = g;
       }
     }
     if (f_exit == 0) return kWalkInside;
-    const double xc = px + t_exit * (x1 - px), yc = py + t_exit * (y1 - py);
+    double xc = px + t_exit * (x1 - px), yc = py + t_exit * (y1 - py);
     const FaceTable& fa = m.faces;
     const int other = fa.element1[f_exit] == e ? fa.element2[f_exit] : fa.element1[f_exit];
     const bool open = other == 0 && fa.code[f_exit] >= 2;
@@ -84,7 +86,12 @@ int WalkPT(const PtModule& pt, const Array1<int>& wetdry, bool avoid_dry, int& e
       return kWalkLost;
     }
     if (other == 0 || (avoid_dry && wetdry[other] == kDry)) {
-      // The move ends on the face, inside this element.
+      // The move ends on the face; a crossing point that rounding put
+      // outside goes back towards the centre until it is inside.
+      for (double frac = 1.0e-12; g_exit.Side(xc, yc) < 0.0 && frac < 1.0; frac *= 16.0) {
+        xc += frac * (cx - xc);
+        yc += frac * (cy - yc);
+      }
       x1 = xc;
       y1 = yc;
       return kWalkClosed;
