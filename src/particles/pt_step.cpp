@@ -17,7 +17,7 @@ namespace vhd {
 
 namespace {
 
-constexpr double kNoValue = -1.0e30;
+constexpr double kNoValue = -1.0e30;  // delete value of the node routines (the 2WET form fills every node)
 constexpr int kMaxWalkElements = 100000;
 
 // Draws of one particle in one step (the counter's last key).
@@ -25,12 +25,62 @@ constexpr std::uint64_t kDrawHorizontal = 0;  // and 1
 constexpr std::uint64_t kDrawVertical = 2;    // and 3
 constexpr std::uint64_t kDrawRelease = 0;     // release step 0: placement
 
-double SurfaceAt(const PtModule& pt, double x, double y, int e) {
-  return CalcPointValue2D(*pt.mesh, x, y, e, pt.eta_node, kNoValue, kModeScalar);
-}
+// Linear interpolation weights of the element's nodes at a point: in a
+// triangle its area coordinates; in a quadrilateral those of the triangle
+// (1, 2, 3) or (1, 3, 4) that holds the point, their mean when both do, the
+// nearer one when neither does (the rule of CalcPointValue2D, with the
+// weights formed once for all fields at the point).
+struct NodeWeights {
+  int n = 0;
+  int node[4] = {0, 0, 0, 0};
+  double w[4] = {0, 0, 0, 0};
+  double Of(const Array1<double>& f) const {
+    double r = 0.0;
+    for (int j = 0; j < n; ++j) r += w[j] * f[node[j]];
+    return r;
+  }
+};
 
-double BedAt(const PtModule& pt, double x, double y, int e) {
-  return CalcPointValue2D(*pt.mesh, x, y, e, pt.bed_node, kNoValue, kModeScalar);
+NodeWeights WeightsAt(const Mesh& mesh, double x, double y, int e) {
+  NodeWeights nw;
+  const ElementTable& el = mesh.elements;
+  nw.n = std::min(ElementNodeCount(el, e), 4);
+  double px[4], py[4];
+  for (int j = 0; j < nw.n; ++j) {
+    nw.node[j] = ElementNode(el, e, j + 1);
+    px[j] = mesh.nodes.x[nw.node[j]] - mesh.nodes.x[nw.node[0]];
+    py[j] = mesh.nodes.y[nw.node[j]] - mesh.nodes.y[nw.node[0]];
+  }
+  const double qx = x - mesh.nodes.x[nw.node[0]], qy = y - mesh.nodes.y[nw.node[0]];
+  // Area coordinates (xi, eta) of q in the triangle (0, b, c); worst: the
+  // smallest of the three.
+  auto tri = [&](int b, int c, double& xi, double& eta) {
+    const double det = px[b] * py[c] - px[c] * py[b];
+    if (det == 0.0) {
+      xi = eta = 0.0;
+      return -1e300;
+    }
+    xi = (qx * py[c] - px[c] * qy) / det;
+    eta = (px[b] * qy - qx * py[b]) / det;
+    return std::min({xi, eta, 1.0 - xi - eta});
+  };
+  double xi1 = 0, eta1 = 0;
+  const double worst1 = tri(1, 2, xi1, eta1);
+  if (nw.n == 3) {
+    nw.w[0] = 1.0 - xi1 - eta1, nw.w[1] = xi1, nw.w[2] = eta1;
+    return nw;
+  }
+  double xi2 = 0, eta2 = 0;
+  const double worst2 = tri(2, 3, xi2, eta2);
+  constexpr double kTol = -1e-10;
+  const bool in1 = worst1 >= kTol, in2 = worst2 >= kTol;
+  const double f1 = in1 && in2 ? 0.5 : in1 ? 1.0 : in2 ? 0.0 : worst1 >= worst2 ? 1.0 : 0.0;
+  const double f2 = 1.0 - f1;
+  nw.w[0] = f1 * (1.0 - xi1 - eta1) + f2 * (1.0 - xi2 - eta2);
+  nw.w[1] = f1 * xi1;
+  nw.w[2] = f1 * eta1 + f2 * xi2;
+  nw.w[3] = f2 * eta2;
+  return nw;
 }
 
 // Signed distance measure of p from the edge (a, b), positive on the side of
@@ -53,6 +103,24 @@ int WalkPT(const PtModule& pt, const Array1<int>& wetdry, bool avoid_dry, int& e
            double& y1) {
   const Mesh& m = *pt.mesh;
   const ElementTable& el = m.elements;
+  // Most moves end in the start element: the test on its node ring first.
+  {
+    const int nc = std::min(ElementNodeCount(el, e), 4);
+    double nx[4], ny[4];
+    for (int j = 0; j < nc; ++j) {
+      const int k = ElementNode(el, e, j + 1);
+      nx[j] = m.nodes.x[k];
+      ny[j] = m.nodes.y[k];
+    }
+    const double orient = (nx[1] - nx[0]) * (ny[2] - ny[0]) - (nx[2] - nx[0]) * (ny[1] - ny[0]) > 0.0 ? 1.0 : -1.0;
+    bool inside = true;
+    for (int j = 0; j < nc && inside; ++j) {
+      const int k = j + 1 == nc ? 0 : j + 1;
+      const double ex = nx[k] - nx[j], ey = ny[k] - ny[j];
+      inside = orient * (ex * (y1 - ny[j]) - ey * (x1 - nx[j])) >= -1.0e-12 * (ex * ex + ey * ey);
+    }
+    if (inside) return kWalkInside;
+  }
   double px = x0, py = y0;
   const int e_start = e;
   for (int visited = 0; visited < kMaxWalkElements; ++visited) {
@@ -149,12 +217,6 @@ double LogProfileFactor(const PtDriftProfile& d, double speed, double h, double 
   return std::max(0.0, std::log(std::max(zb, z0) / z0)) / mean;
 }
 
-void CurrentAt(const PtModule& pt, const Array1<double>& un, const Array1<double>& vn, double x, double y, int e,
-               double& u, double& v) {
-  u = CalcPointValue2D(*pt.mesh, x, y, e, un, kNoValue, kModeScalar);
-  v = CalcPointValue2D(*pt.mesh, x, y, e, vn, kNoValue, kModeScalar);
-}
-
 // Metres to mesh units at latitude y (radians on a "LONG/LAT" mesh).
 void MetresToMesh(const PtModule& pt, double y, double& dx, double& dy) {
   if (!pt.geographic) return;
@@ -195,8 +257,9 @@ bool Release(PtModule& pt, const HdState& hd, int source, int cls, double x, dou
   p.source = source;
   p.x = x;
   p.y = y;
-  const double surface = hd.wetdry[e] == kDry ? BedAt(pt, x, y, e) : SurfaceAt(pt, x, y, e);
-  const double bed = BedAt(pt, x, y, e);
+  const NodeWeights nw = WeightsAt(*pt.mesh, x, y, e);
+  const double bed = nw.Of(pt.bed_node);
+  const double surface = hd.wetdry[e] == kDry ? bed : nw.Of(pt.eta_node);
   switch (vertical_type) {
     case 0: p.z = std::clamp(z, bed, std::max(bed, surface)); break;
     case 1: p.z = std::max(bed, surface); break;
@@ -307,8 +370,9 @@ void StepPT(PtModule& pt, const HdState& hd, int n) {
     }
     int e = p.element;
     const double h = hd.h[e];
-    const double bed = BedAt(pt, p.x, p.y, e);
-    const double surface = std::max(bed, SurfaceAt(pt, p.x, p.y, e));
+    const NodeWeights wa = WeightsAt(mesh, p.x, p.y, e);
+    const double bed = wa.Of(pt.bed_node);
+    const double surface = std::max(bed, wa.Of(pt.eta_node));
     if (p.state == kParticleSedimented) {
       if (c.erosion && hd.wetdry[e] == kWet && !hd.tau_x.empty() &&
           std::hypot(hd.tau_x[e], hd.tau_y[e]) > c.critical_shear) {
@@ -327,22 +391,17 @@ void StepPT(PtModule& pt, const HdState& hd, int n) {
       const double speed = std::hypot(hd.u[e], hd.v[e]);
       factor = LogProfileFactor(drift, speed, h, zb);
     }
-    double ua = 0, va = 0, ub = 0, vb = 0;
-    CurrentAt(pt, pt.u0, pt.v0, p.x, p.y, e, ua, va);
-    ua *= factor;
-    va *= factor;
+    const double ua = factor * wa.Of(pt.u0), va = factor * wa.Of(pt.v0);
     double dxa = ua * dt, dya = va * dt;
     MetresToMesh(pt, p.y, dxa, dya);
     double xp = p.x + dxa, yp = p.y + dya;
     int ep = e;
     const int wp = WalkPT(pt, hd.wetdry, c.flood_dry_type == 1, ep, p.x, p.y, xp, yp);
-    if (wp == kWalkInside || wp == kWalkSearched) {
-      CurrentAt(pt, pt.u1, pt.v1, xp, yp, ep, ub, vb);
-    } else {
-      CurrentAt(pt, pt.u1, pt.v1, p.x, p.y, e, ub, vb);
-    }
-    ub *= factor;
-    vb *= factor;
+    // A predicted position that left the water takes the end current at the
+    // start position.
+    const NodeWeights wb =
+        wp == kWalkInside || wp == kWalkSearched ? WeightsAt(mesh, xp, yp, ep) : wa;
+    const double ub = factor * wb.Of(pt.u1), vb = factor * wb.Of(pt.v1);
     double u = 0.5 * (ua + ub), v = 0.5 * (va + vb);
     if (has_drift) {
       double ud = 0, vd = 0;
@@ -389,8 +448,9 @@ void StepPT(PtModule& pt, const HdState& hd, int n) {
     p.x = x1;
     p.y = y1;
     p.element = e;
-    const double bed1 = BedAt(pt, p.x, p.y, e);
-    const double surface1 = std::max(bed1, SurfaceAt(pt, p.x, p.y, e));
+    const NodeWeights w1 = WeightsAt(mesh, p.x, p.y, e);
+    const double bed1 = w1.Of(pt.bed_node);
+    const double surface1 = std::max(bed1, w1.Of(pt.eta_node));
     if (z <= bed1 && c.settling_velocity > 0.0) {
       z = bed1;
       p.state = kParticleSedimented;
