@@ -103,7 +103,7 @@ struct PtSource {
   bool include = true;
   int type = kSourcePoint;
   int format = 0;
-  int first_step = 1, last_step = 1 << 30;  // steps on which it releases
+  int first_step = 1, last_step = 1 << 30;  // steps on which it releases (not a file source)
   // Point source: one position; moving (format 1): positions at times
   // (seconds since the start), linear between them, held outside.
   std::vector<double> times, xs, ys, zs;

@@ -327,9 +327,15 @@ void SetupSource(PtModule& pt, PtSource& s, const RunControl& run) {
     SetupError("Type not supported for the vertical placement of a source", "vertical_type",
                std::to_string(s.vertical_type));
   SktReadKeyword("fail_on_misplaced", s.fail_on_misplaced, false);
+  // Release window: steps first_time_step .. last_time_step; an initial
+  // source releases on its first step only.
+  SktReadKeyword("first_time_step", s.first_step, 1);
+  SktReadKeyword("last_time_step", s.last_step, pt.time.last_step);
   bool initial = false;
   SktReadKeyword("initial_source", initial, false);
   if (initial) s.last_step = s.first_step;
+  if (s.first_step > s.last_step)
+    SetupError("first_time_step is after last_time_step", "first_time_step", std::to_string(s.first_step));
 
   if (s.type == kSourcePoint) {
     // Fixed: coordinates = [x, y, z]; moving: coordinates = [[t, x, y, z], ...].

@@ -241,10 +241,13 @@ void WriteXmlStep(const PtModule& pt, PtOutput& o, int n, double t) {
     for (int i = 1; i <= pt.nparticles && ok; ++i) {
       const Particle& p = pt.particles[i];
       if (p.cls != static_cast<int>(k) || !Active(p) || !Selected(o, i)) continue;
+      char number[16];
       ok = xmlTextWriterStartElement(w, X("Particle")) >= 0;
-      ok = ok && xmlTextWriterWriteFormatAttribute(w, X("Nr"), "%d", i) >= 0;
+      std::snprintf(number, sizeof number, "%d", i);
+      ok = ok && xmlTextWriterWriteAttribute(w, X("Nr"), X(number)) >= 0;
       ok = ok && xmlTextWriterStartElement(w, X("Source")) >= 0;
-      ok = ok && xmlTextWriterWriteFormatAttribute(w, X("ID"), "%d", p.source) >= 0;
+      std::snprintf(number, sizeof number, "%d", p.source);
+      ok = ok && xmlTextWriterWriteAttribute(w, X("ID"), X(number)) >= 0;
       ok = ok && xmlTextWriterEndElement(w) >= 0;
       const int nv = ParticleValues(pt, o, p, v);
       int len = 0;
