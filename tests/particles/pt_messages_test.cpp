@@ -3,6 +3,8 @@
 
 #include <gtest/gtest.h>
 
+#include <ostream>
+
 #include "pt_support.hpp"
 
 namespace vhd::test {
@@ -26,6 +28,9 @@ struct MessageCase {
   std::string plaintext;    // contents of particles.txt beside the setup (when not empty)
   const char* message;
 };
+
+// The case's name in test output (instead of its bytes).
+void PrintTo(const MessageCase& c, std::ostream* os) { *os << c.name; }
 
 std::vector<MessageCase> Cases() {
   return {
