@@ -5,6 +5,7 @@
 #include <algorithm>
 #include <cmath>
 #include <fstream>
+#include <new>
 #include <sstream>
 #include <string>
 
@@ -177,6 +178,8 @@ void SetupGridded(PtModule& pt, PtSource& s, const std::string& coordinate_type)
       SetupError("Unknown fillmode for gridded source", "fillmode", std::to_string(fillmode));
     // fillmode 1: the cell centres of the grid; 2: its corners.
     const int nr = fillmode == 1 ? rows : rows + 1, nc = fillmode == 1 ? columns : columns + 1;
+    if (static_cast<long long>(nr) * nc > 100000000LL)
+      SetupError("A gridded source has at most 100000000 points", "rows", std::to_string(rows));
     const double off = fillmode == 1 ? 0.5 : 0.0;
     const double c = std::cos(rotation * kDegToRad), sn = std::sin(rotation * kDegToRad);
     for (int i = 0; i < nr; ++i)
@@ -579,7 +582,11 @@ void SetupPT(PtModule& pt, int selected_mode, const RunControl& run, const TimeA
     FatalError("SetupPT: the sources would release " + std::to_string(capacity) +
                " particles; at most 2000000000 can be tracked");
   pt.capacity = static_cast<int>(capacity);
-  pt.particles.assign(pt.capacity);
+  try {
+    pt.particles.assign(pt.capacity);
+  } catch (const std::bad_alloc&) {
+    FatalError("SetupPT: Out of memory (a pool of " + std::to_string(capacity) + " particles)");
+  }
   pt.nparticles = 0;
   const int nnodes = mesh.nodes.nnodes;
   pt.u0.assign(nnodes);
