@@ -6,7 +6,7 @@
 set -eu
 PACKAGES="build-essential cmake ninja-build pkg-config
 libtomlplusplus-dev libnetcdf-dev netcdf-bin libfmt-dev libproj-dev proj-data
-libmetis-dev libopenmpi-dev openmpi-bin
+libmetis-dev libopenmpi-dev openmpi-bin libxml2-dev
 libgtest-dev libgmock-dev libbenchmark-dev
 python3 python3-numpy python3-matplotlib python3-netcdf4 python3-xarray gmsh
 python3-qgis python3-paraview"

@@ -5,6 +5,8 @@
   plot_result.py area.zrnu --item "Current speed" --max -o speed_max.png
   plot_result.py points.zrn0 -o series.png
   plot_result.py points.zrn0 --item "A: Surface elevation" -o a.png
+  plot_result.py tracks.nc --mesh area.zrnu -o tracks.png
+  plot_result.py tracks.xml --mesh area.zrnu -o tracks.png
 
 A .zrnu file gives a map of one element item on the mesh's triangles and
 quadrilaterals, at a step (from 0; negative counts from the end, default the
@@ -12,7 +14,10 @@ last) or as its maximum over all steps. A .zrn0 file gives time series of its
 items (all, or those named with --item), one panel per unit. Items are named
 by their item name (the variable's zrn_item_name, else its long_name) or
 their variable name. Delete
-values are left blank. Writes a PNG.
+values are left blank. A particle track file (the CF trajectory .nc or the
+XML track file) gives the tracks of its particles, each a line from its
+first to its last position, over the mesh of a .zrnu file given with
+--mesh. Writes a PNG.
 """
 
 import argparse
@@ -128,6 +133,73 @@ def plot_map(nc, args):
     return fig
 
 
+def mesh_polygons(path):
+    """The elements of the mesh of a .zrnu file as polygons."""
+    with netCDF4.Dataset(path) as nc:
+        topo = [v for v in nc.variables.values() if getattr(v, "cf_role", "") == "mesh_topology"]
+        if not topo:
+            fail(path + " has no mesh topology")
+        xname, yname = topo[0].node_coordinates.split()
+        x = np.asarray(nc.variables[xname][:], dtype=float)
+        y = np.asarray(nc.variables[yname][:], dtype=float)
+        conn_var = nc.variables[topo[0].face_node_connectivity]
+        conn = np.ma.filled(conn_var[:], -1).astype(int)
+        start = int(getattr(conn_var, "start_index", 0))
+    return [np.column_stack((x[row[row >= start] - start], y[row[row >= start] - start])) for row in conn]
+
+
+def read_tracks(path):
+    """Per particle number, its x and y positions in time order."""
+    tracks = {}
+    if path.endswith(".nc"):
+        with netCDF4.Dataset(path) as nc:
+            if getattr(nc, "featureType", "") != "trajectory":
+                fail(path + " is not a trajectory file")
+            ids = nc.variables["trajectory"][:]
+            index = nc.variables["trajectory_index"][:]
+            xname, yname = ("lon", "lat") if "lon" in nc.variables else ("x", "y")
+            x, y = nc.variables[xname][:], nc.variables[yname][:]
+            for k, particle in enumerate(ids):
+                mine = index == k
+                if mine.any():
+                    tracks[int(particle)] = (np.asarray(x[mine]), np.asarray(y[mine]))
+        return tracks
+    import gzip
+    import xml.etree.ElementTree as ET
+    opener = gzip.open if path.endswith(".gz") else open
+    with opener(path, "rb") as f:
+        for _, element in ET.iterparse(f):
+            if element.tag != "Particle":
+                continue
+            values = "".join(element.itertext()).split()
+            xs, ys = tracks.setdefault(int(element.get("Nr")), ([], []))
+            xs.append(float(values[0]))
+            ys.append(float(values[1]))
+            element.clear()
+    return {k: (np.array(v[0]), np.array(v[1])) for k, v in tracks.items()}
+
+
+def plot_tracks(args):
+    tracks = read_tracks(args.file)
+    if not tracks:
+        fail(args.file + " holds no particle positions")
+    fig, ax = plt.subplots(figsize=(10, 6))
+    if args.mesh:
+        ax.add_collection(PolyCollection(mesh_polygons(args.mesh), facecolors="none", edgecolors="0.8",
+                                         linewidths=0.3))
+    colours = plt.get_cmap(args.cmap)
+    for k, (particle, (x, y)) in enumerate(sorted(tracks.items())):
+        colour = colours(k / max(1, len(tracks) - 1))
+        ax.plot(x, y, color=colour, linewidth=0.6)
+        ax.plot(x[-1:], y[-1:], marker=".", color=colour, markersize=3)
+    ax.autoscale_view()
+    ax.set_aspect("equal")
+    ax.set_title("Tracks of %d particles (%s)" % (len(tracks), args.file.rsplit("/", 1)[-1]))
+    ax.set_xlabel("x")
+    ax.set_ylabel("y")
+    return fig
+
+
 def plot_series(nc, args):
     candidates = [n for n in item_variables(nc) if nc.variables[n].dimensions == ("time",)]
     if not candidates:
@@ -157,7 +229,8 @@ def plot_series(nc, args):
 
 def main():
     parser = argparse.ArgumentParser(description=__doc__, formatter_class=argparse.RawDescriptionHelpFormatter)
-    parser.add_argument("file", help="a .zrnu (map) or .zrn0 (time series) result file")
+    parser.add_argument("file", help="a .zrnu (map) or .zrn0 (time series) result file, or a particle track file")
+    parser.add_argument("--mesh", help="a .zrnu file whose mesh is drawn under particle tracks")
     parser.add_argument("--item", action="append", dest="item_list",
                         help="item name or variable name (map: one; series: repeat for several)")
     parser.add_argument("--step", type=int, help="step of a map, from 0; negative from the end (default: last)")
@@ -167,13 +240,20 @@ def main():
     args = parser.parse_args()
     args.item = args.item_list[0] if args.item_list else None
     output = args.output or args.file.rsplit(".", 1)[0] + ".png"
-    try:
-        nc = netCDF4.Dataset(args.file)
-    except OSError as error:
-        fail("cannot open %s: %s" % (args.file, error))
-    with nc:
-        is_mesh = any(getattr(v, "cf_role", "") == "mesh_topology" for v in nc.variables.values())
-        fig = plot_map(nc, args) if is_mesh else plot_series(nc, args)
+    if args.file.endswith((".xml", ".xml.gz")):
+        fig = plot_tracks(args)
+    else:
+        try:
+            nc = netCDF4.Dataset(args.file)
+        except OSError as error:
+            fail("cannot open %s: %s" % (args.file, error))
+        with nc:
+            trajectory = getattr(nc, "featureType", "") == "trajectory"
+            is_mesh = any(getattr(v, "cf_role", "") == "mesh_topology" for v in nc.variables.values())
+            if not trajectory:
+                fig = plot_map(nc, args) if is_mesh else plot_series(nc, args)
+        if trajectory:
+            fig = plot_tracks(args)
     fig.tight_layout()
     fig.savefig(output, dpi=120)
     print(output)

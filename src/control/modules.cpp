@@ -3,6 +3,7 @@
 
 #include "control/hd_driver_module.hpp"
 #include "control/module.hpp"
+#include "control/pt_driver_module.hpp"
 #include "control/st_driver_module.hpp"
 #include "io/setup.hpp"
 #include "log/log.hpp"
@@ -51,12 +52,14 @@ int ModuleMode(const ModuleSelection& s, ModuleKind kind) {
   return 0;
 }
 
-std::unique_ptr<Module> CreateModule(ModuleKind kind, int /*mode*/) {
+std::unique_ptr<Module> CreateModule(ModuleKind kind, int mode) {
   switch (kind) {
     case ModuleKind::HD:
       return std::make_unique<HdDriverModule>();
     case ModuleKind::ST:
       return std::make_unique<StDriverModule>();
+    case ModuleKind::PT:
+      return std::make_unique<PtDriverModule>(mode);
     default:
       return nullptr;
   }
