@@ -27,6 +27,8 @@ class HdDriverModule final : public Module {
   double MeshSizeFigure() const override;
 
   const HdModule& hd() const { return hd_; }
+  const HdSolver& solver() const { return solver_; }
+  const Mesh& mesh() const { return *mesh_; }
 
  private:
   HdModule hd_;

@@ -50,6 +50,8 @@ struct ModuleContext {
   const ModuleSelection& selection;
   Domain& domain;  // the meshes of this process
   Subdomain& subdomain;  // this process's part of the 2D mesh
+  // The modules set up before this one (set by SetupModules).
+  const ModuleSet* modules = nullptr;
 };
 
 class Module {

@@ -3,6 +3,7 @@
 
 #include "control/hd_driver_module.hpp"
 #include "control/module.hpp"
+#include "control/tr_driver_module.hpp"
 #include "io/setup.hpp"
 #include "log/log.hpp"
 
@@ -54,6 +55,8 @@ std::unique_ptr<Module> CreateModule(ModuleKind kind, int /*mode*/) {
   switch (kind) {
     case ModuleKind::HD:
       return std::make_unique<HdDriverModule>();
+    case ModuleKind::TR:
+      return std::make_unique<TrDriverModule>();
     default:
       return nullptr;
   }
@@ -65,7 +68,9 @@ std::string ModuleSectionName(ModuleKind kind) {
   return name;
 }
 
-void SetupModules(ModuleSet& modules, const ModuleContext& context) {
+void SetupModules(ModuleSet& modules, const ModuleContext& run_context) {
+  ModuleContext context = run_context;
+  context.modules = &modules;
   for (const ModuleKind kind : kSetupOrder) {
     const int mode = ModuleMode(context.selection, kind);
     if (mode <= 0) {

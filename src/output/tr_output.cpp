@@ -68,9 +68,33 @@ int Owned(const Mesh& mesh) {
 
 // Amounts c h A of component k (k = 0: the water volume h A) on the owned elements.
 void Amounts(TrOutputs& out, const TrModule& tr, const HdState& s, int k, int nown) {
-  const double* c = k > 0 ? tr.data[k].c.data() : nullptr;
+  const double* c = k > 0 ? tr.data[k].ad.c.data() : nullptr;
   VHD_OMP_PARALLEL_FOR
   for (int e = 1; e <= nown; ++e) out.amount[e] = (c ? c[e] : 1.0) * s.h[e] * out.area[e];
+}
+
+// The accumulated terms of the components of a budget: the solver's totals
+// since the start of the transport, over the whole model area
+// (SetupOutputsTR refuses polygons for components).
+void ComponentTerms(MassBudgetSpec& budget, const TrModule& tr) {
+  for (BudgetComponent& b : budget.components) {
+    if (b.index == 0) continue;
+    const AdComponent& ad = tr.data[b.index].ad;
+    b.transport.Clear();
+    b.transport.Add(ad.boundary_inflow);
+    b.transport.Subtract(ad.boundary_outflow);
+    b.source.Clear();
+    b.source.Add(ad.source_inflow);
+    b.source.Subtract(ad.source_outflow);
+    b.process.Clear();
+    b.defect.Clear();
+    for (int e : budget.elements) {
+      b.process += ad.surface_total[e];
+      b.process += -ad.decay_total[e];
+      b.defect += ad.clamp_total[e];
+      b.defect += ad.drying_total[e];
+    }
+  }
 }
 
 }  // namespace
@@ -87,11 +111,20 @@ void SetupOutputsTR(TrOutputs& out, const TrModule& tr, const Mesh& mesh, const 
   SktOpenSection("TRANSPORT_MODULE", kNoIndex, nullptr, false);
   SetupOutputs(out.list, info, mesh, run, time);
   SktCloseSection();
-  for (const OutputSpec& spec : out.list.outputs)
+  for (const OutputSpec& spec : out.list.outputs) {
     if (spec.type == kOutputDischarge)
       FatalError("SpecOutputFileTR: Output type not supported - type 4 (a discharge is an output of the "
                  "hydrodynamic module) (section " +
                  spec.section + ")");
+    // The solver books what enters through the boundaries and sources over
+    // the whole model area, not across the border of a polygon.
+    if (spec.type == kOutputMassBudget && !spec.budget.px.empty())
+      for (const BudgetComponent& b : spec.budget.components)
+        if (b.index > 0)
+          FatalError("SpecMassBudget: the budget of component" + b.name +
+                     " covers the whole model area; give no polygon in " + spec.section +
+                     " (a polygon is possible with FLOW alone)");
+  }
 }
 
 void OpenOutputFilesTR(TrOutputs& out, const Mesh& mesh) {
@@ -121,7 +154,7 @@ void StartBudgetsTR(TrOutputs& out, const TrModule& tr, const HdModule& hd, cons
   out.started = true;
 }
 
-void UpdateOutputsTR(TrOutputs& out, const TrModule& tr, const HdModule& hd, const Mesh& mesh, double dt) {
+void UpdateOutputsTR(TrOutputs& out, const HdModule& hd, const Mesh& mesh, double dt) {
   const int nown = Owned(mesh);
   const bool process = hd.precipitation.Active();
   bool rate_done = false;
@@ -131,7 +164,8 @@ void UpdateOutputsTR(TrOutputs& out, const TrModule& tr, const HdModule& hd, con
       const int k = static_cast<int>(c);
       const int index = spec.budget.components[c].index;
       if (index == 0) {
-        // The water volume, as the hydrodynamic budgets book it.
+        // The water volume, as the hydrodynamic budgets book it; the
+        // components' terms are taken from the solver when written.
         AccumulateBudgetTransport(spec.budget, k, hd.state.face_flux_len, dt);
         if (hd.sources.Active()) AccumulateBudgetSource(spec.budget, k, hd.sources.element_rate, dt);
         if (process) {
@@ -146,12 +180,6 @@ void UpdateOutputsTR(TrOutputs& out, const TrModule& tr, const HdModule& hd, con
           AccumulateBudgetDefect(spec.budget, k, hd.flood_dry.mass_cut);
         continue;
       }
-      const TrComponentData& d = tr.data[index];
-      // The step's amounts: the rates of AccumulateBudget* times 1.
-      AccumulateBudgetTransport(spec.budget, k, d.face_amount, 1.0);
-      AccumulateBudgetSource(spec.budget, k, d.source_amount, 1.0);
-      AccumulateBudgetProcess(spec.budget, k, d.process_amount, 1.0);
-      AccumulateBudgetDefect(spec.budget, k, d.clamp_amount);
     }
   }
 }
@@ -161,7 +189,7 @@ void TrItemValues(const TrModule& tr, const HdModule& hd, const Mesh& mesh, int 
   const HdState& s = hd.state;
   const int ne = mesh.elements.nelements;
   const int nown = Owned(mesh);
-  const double* c = code > 0 ? tr.data[code].c.data() : nullptr;
+  const double* c = code > 0 ? tr.data[code].ad.c.data() : nullptr;
   const double dt = hd.dt_last;
   VHD_OMP_PARALLEL_FOR
   for (int e = 1; e <= nown; ++e) {
@@ -196,6 +224,7 @@ void WriteOutputTR(TrOutputs& out, const TrModule& tr, const HdModule& hd, const
         }
         break;
       case kOutputMassBudget: {
+        if (out.started) ComponentTerms(spec.budget, tr);
         std::size_t current = spec.budget.components.size();
         BudgetAmounts now;
         for (const OutputItem& item : spec.items) {

@@ -56,7 +56,7 @@ void OpenOutputFilesTR(TrOutputs& out, const Mesh& mesh);
 // The initial amounts of the budgets, when the transport starts.
 void StartBudgetsTR(TrOutputs& out, const TrModule& tr, const HdModule& hd, const Mesh& mesh);
 // After a transport step of length dt: the accumulated budget terms.
-void UpdateOutputsTR(TrOutputs& out, const TrModule& tr, const HdModule& hd, const Mesh& mesh, double dt);
+void UpdateOutputsTR(TrOutputs& out, const HdModule& hd, const Mesh& mesh, double dt);
 void WriteOutputTR(TrOutputs& out, const TrModule& tr, const HdModule& hd, const Mesh& mesh, int n, double t);
 void CloseOutputFilesTR(TrOutputs& out);
 void OutputStatisticsTR(const TrOutputs& out, const RunControl& run);

@@ -22,33 +22,37 @@
 // field that keeps its initial values (not transported: a tracer of
 // nothing, kept for outputs and budgets).
 //
-// Concentration types of the water that enters or leaves (each in its own
-// subsection with a time-varying value):
-//   precipitation  type 0: rain carries nothing; 1: rain carries the value of
-//                  PRECIPITATION;
-//   evaporation    type 0: evaporation takes nothing (the component stays
-//                  behind and concentrates); 1: the evaporated water takes
-//                  the value of EVAPORATION;
-//   infiltration   type 0: nothing; 1: the value of INFILTRATION. The HD
-//                  module of this build has no infiltration, so no water
-//                  carries it; the setting is read and kept.
+// Concentration types of the water that enters or leaves (each with a
+// time-varying value in its own subsection):
+//   type_of_precipitation, type_of_evaporation: 0 the water carries nothing
+//   (evaporation leaves the component behind, which concentrates), 1 the
+//   water carries the value of PRECIPITATION or EVAPORATION, 2 the water
+//   carries the concentration of its element;
+//   type_of_infiltration: the same codes; the HD module of this build has no
+//   infiltration, so no water carries it (the setting is read and kept).
 // Sources, type 1: the released water carries the given concentration;
 // type 2: the given value is an excess over the ambient concentration.
 // Withdrawn water always carries the concentration of its element.
 //
-// Boundary types per code and component:
+// Boundary types per code and component (water that leaves always carries
+// the concentration of its element, the outflow rule):
 //   1  no data: water that enters carries the concentration of the inner
-//      element (the gradient across the boundary is zero);
-//   2  a time-varying concentration, one value per face (a constant, a
-//      point series, or a line series along the boundary), carried by the
-//      water that enters; water that leaves carries the inner concentration
-//      (the outflow rule);
-//   3  as 2, and the dispersive flux across the face is formed against the
-//      boundary value, so the value holds at the face also where the water
-//      leaves or stands still;
-//   6  cyclic: the face sees the element behind the partner code's face
-//      (code_cyclic, or the one cyclic code with the same face count).
-// Land faces (HD types 1 and 2) carry nothing whatever the type.
+//      element;
+//   2  water that enters carries one value for the whole boundary: a
+//      constant or a point series (.zrn0);
+//   3  water that enters carries values along the boundary: a line series
+//      (.zrn1) spread from the first to the last face, or a constant or a
+//      point series;
+//   6  cyclic: water that enters carries the concentration of the element
+//      behind the partner face; the flow boundary must be cyclic too, and
+//      the code's partner is code_cyclic, or the one cyclic code with the
+//      same number of faces.
+// Land faces carry nothing whatever the type.
+//
+// Time: the transport steps with every HD sub-step, over the volumes that
+// sub-step moved (ad_solver.hpp). Time-varying inputs are taken at the
+// middle of the sub-step. Before start_time_step the module only follows
+// the depths; at the start its components take their initial conditions.
 
 #include <string>
 #include <vector>
@@ -58,6 +62,7 @@
 #include "hydro/hd_module.hpp"
 #include "io/dataspec.hpp"
 #include "log/log.hpp"
+#include "hydro/sw_fluxes.hpp"
 #include "transport/ad_solver.hpp"
 
 namespace vhd {
@@ -80,7 +85,7 @@ struct TrComponent {
 
 inline constexpr int kTrBoundaryNone = 1;
 inline constexpr int kTrBoundaryValue = 2;
-inline constexpr int kTrBoundaryValueDispersive = 3;
+inline constexpr int kTrBoundaryAlong = 3;
 inline constexpr int kTrBoundaryCyclic = 6;
 
 // Boundary data of one code for one component.
@@ -88,7 +93,7 @@ struct TrBoundaryCode {
   int type = kTrBoundaryNone;
   int code_cyclic = 0;
   int partner = 0;  // cyclic: the partner code
-  DataSpec data;    // types 2 and 3
+  DataSpec data;    // types 2 and 3, on the code's faces in walking order
 };
 
 // Water that enters or leaves with a concentration (precipitation,
@@ -106,18 +111,17 @@ struct TrSourceConcentration {
 
 // Everything the module holds per component beside its record.
 struct TrComponentData {
+  AdComponent ad;               // concentration, limits, inputs of the solver, what it booked
   AdDispersion dispersion;
-  int decay_type = 0;          // 0 none, 1 first-order decay with the rate field
-  ElementField decay;          // rate (1/s)
+  ElementField dispersion_map;  // format 3 coefficient: the file that fills dispersion.field
+  int decay_type = 0;           // 0 none, 1 first-order decay with the rate field
+  ElementField decay;           // rate (1/s)
   TrWaterConcentration precipitation, evaporation, infiltration;
   std::vector<TrSourceConcentration> sources;  // per HD source (index 0 is SOURCE_1)
   int initial_type = 1;
-  ElementField initial;        // concentration
-  Array1<TrBoundaryCode> codes;  // per boundary code 1 .. ncodes
-  // Per boundary face of the HD face list: the new and the old value
-  // (values[2k-1] new, values[2k] old of face condition k).
-  Array1<double> boundary_values;
-  Array1<double> c;            // concentration per element
+  ElementField initial;         // concentration
+  Array1<TrBoundaryCode> codes; // per boundary code 1 .. ncodes
+  Array1<double> work;          // values of one input on the code's faces or the elements
 };
 
 // Timers of the transport timing set.
@@ -144,6 +148,11 @@ struct TrModule {
 
   AdSolutionTechnique solution;
   Array1<TrComponentData> data;  // 1 .. number_of_components
+  AdSolver solver;
+  AdFlow flow;
+  bool started = false;          // the components hold their initial conditions and are advanced
+  double dt_last = 0.0;          // the last transport step (s)
+  long long n_steps = 0, n_substeps = 0;
 
   TimeAxis time_axis;
   int process_id = -1;
@@ -163,5 +172,23 @@ void SetupSolutionMethodTR(TrModule& tr, const HdModule& hd);
 void SetupPropertyTR(TrModule& tr, const HdModule& hd, const Mesh& mesh);
 void SetupInitialConditionsTR(TrModule& tr, const HdModule& hd, const Mesh& mesh);
 void SetupBoundCondTR(TrModule& tr, const HdModule& hd, const Mesh& mesh);
+
+// After the HD setup of its solver: the advection-dispersion solver and the
+// flow record.
+void SetupSolverTR(TrModule& tr, const HdModule& hd, const HdSolver& hd_solver, const Mesh& mesh);
+
+// Gives every component its initial condition and makes the current depths
+// the start of the first transport step. The driver calls it at the start
+// time: in the initial step, or after the HD sub-step that reached it.
+void InitialStepTR(TrModule& tr, const HdModule& hd);
+
+// The HD sub-step of length dt ending at t, just taken by StepHD: the flow
+// it moved, the time-varying inputs at its middle, the dispersion and one
+// solver step of every type-2 component. Before InitialStepTR only the
+// depths are followed.
+void StepTR(TrModule& tr, const HdModule& hd, const HdSolver& hd_solver, const Mesh& mesh, double t, double dt);
+
+// Closes the input data files (each logs its "Data File Summary").
+void CloseInputsTR(TrModule& tr);
 
 }  // namespace vhd

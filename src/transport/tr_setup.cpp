@@ -90,13 +90,13 @@ void ReadComponent(TrComponent& c, int k, bool section_open) {
 void ReadWaterConcentration(TrWaterConcentration& w, std::string_view type_key, std::string_view section,
                             const std::string& format_message, const Mesh& mesh, const TimeAxis& time) {
   SktReadKeyword(type_key, w.type, 1);
-  if (w.type != 0 && w.type != 1)
+  if (w.type != kAdExchangeNothing && w.type != kAdExchangeValue && w.type != kAdExchangeAmbient)
     FatalError("Type not supported for " + std::string(section == "PRECIPITATION"   ? "precipitation"
                                                        : section == "EVAPORATION" ? "evaporation"
                                                                                   : "infiltration") +
                Where(type_key, w.type));
   InitDataSpec(w.data, 1);
-  if (w.type == 0) return;
+  if (w.type != kAdExchangeValue) return;
   const bool open = OpenOptionalSectionHD(section);
   static constexpr int kFormats[] = {kDataConstant, kDataFile, kDataFileOnce, kDataFileMap};
   if (open) {
@@ -144,12 +144,12 @@ void ReadBoundaryCode(TrBoundaryCode& b, const HdModule& hd, const Mesh& mesh, i
     case kTrBoundaryNone:
       break;
     case kTrBoundaryValue:
-    case kTrBoundaryValueDispersive: {
+    case kTrBoundaryAlong: {
       ReadDataSpec(b.data, 1);
       const std::vector<int> faces = CodeFaces(hd.boundary, code);
       if (faces.empty()) break;
       FemDataRequest request;
-      request.expect = FemDataExpect::kLine;
+      request.expect = b.type == kTrBoundaryValue ? FemDataExpect::kPoint : FemDataExpect::kLine;
       request.location = FemDataLocation::kFaces;
       request.mesh = &mesh;
       request.entities = faces;
@@ -201,7 +201,83 @@ void PairCyclicTR(TrComponentData& d, const HdBoundary& bc, const Mesh& mesh, in
   }
 }
 
+// HORIZONTAL_DISPERSION of the current DISPERSION/COMPONENT_k section (when
+// present): the type and the scaled eddy viscosity or the coefficient, each a
+// constant or a map of the mesh (the coefficient's map may vary in time).
+void ReadDispersion(TrComponentData& d, const HdModule& hd, const Mesh& mesh, const TimeAxis& time) {
+  AdDispersion& disp = d.dispersion;
+  if (!OpenOptionalSectionHD("HORIZONTAL_DISPERSION")) return;
+  SktReadKeyword("type", disp.type, kAdDispersionScaledEddy);
+  const int ne = mesh.elements.nelements;
+  const Array1<int>& file_index = hd.state.element_file_index;
+  switch (disp.type) {
+    case kAdDispersionNone:
+      break;
+    case kAdDispersionScaledEddy:
+      if (OpenOptionalSectionHD("SCALED_EDDY_VISCOSITY")) {
+        SktReadKeyword("format", disp.format, 0);
+        if (disp.format == 0) {
+          SktReadKeyword("sigma", disp.sigma, 1.0);
+        } else if (disp.format == 2) {
+          std::string file;
+          int item = 1;
+          SktReadFileName("file_name", file, std::string());
+          SktReadKeyword("item_number", item, 1);
+          if (file.empty()) FatalError("SetupDiffusion: file_name missing in " + SktSectionPath());
+          ReadElementFileHD(file, item, file_index, ne, disp.field, "SetupDiffusion");
+        } else {
+          FatalError("Format not supported for dispersion" + Where("format", disp.format) +
+                     "; 0 constant, 2 a map of the mesh");
+        }
+        SktCloseSection();
+      }
+      if (!(disp.sigma > 0.0)) FatalError("SetupDiffusion: sigma must be positive in " + SktSectionPath());
+      break;
+    case kAdDispersionCoefficient:
+      if (OpenOptionalSectionHD("DISPERSION_COEFFICIENT")) {
+        ReadElementFieldHD(d.dispersion_map, 0.01, file_index, ne, true,
+                           "Format not supported for dispersion coef. (format in " + SktSectionPath() + ")",
+                           "SetupDiffusion", time);
+        disp.format = d.dispersion_map.format;
+        disp.constant_value = d.dispersion_map.constant_value;
+        if (disp.format != 0) disp.field = d.dispersion_map.values;
+        SktCloseSection();
+      }
+      break;
+    default:
+      FatalError("Type not supported for dispersion" + Where("type", disp.type) +
+                 "; 0 none, 1 scaled eddy viscosity, 2 dispersion coefficient");
+  }
+  SktReadKeyword("minimum_dispersion", disp.minimum_dispersion, 0.0);
+  SktReadKeyword("maximum_dispersion", disp.maximum_dispersion, 1.0e10);
+  if (!(disp.minimum_dispersion <= disp.maximum_dispersion))
+    FatalError("SetupDiffusion: minimum_dispersion is above maximum_dispersion in " + SktSectionPath());
+  SktCloseSection();
+}
+
 }  // namespace
+
+void SetupSolutionMethodTR(TrModule& tr, const HdModule& /*hd*/) {
+  AdSolutionTechnique& s = tr.solution;
+  if (!OpenOptionalSectionHD("SOLUTION_TECHNIQUE")) return;
+  const AdSolutionTechnique def;
+  SktReadKeyword("scheme_of_time_integration", s.scheme_of_time_integration, def.scheme_of_time_integration);
+  SktReadKeyword("scheme_of_space_discretization_horizontal", s.scheme_of_space_discretization_horizontal,
+                 def.scheme_of_space_discretization_horizontal);
+  if (tr.ndim == 3)
+    SktReadKeyword("scheme_of_space_discretization_vertical", s.scheme_of_space_discretization_vertical,
+                   def.scheme_of_space_discretization_vertical);
+  // Gradients serve the second order and the tangential part of the dispersion.
+  SktReadKeyword("gradient_calculation", s.gradient_calculation, def.gradient_calculation);
+  SktReadKeyword("gradient_limiter", s.gradient_limiter, def.gradient_limiter);
+  SktReadKeyword("face_value_limiter", s.face_value_limiter, def.face_value_limiter);
+  SktReadKeyword("boundary_correction", s.boundary_correction, def.boundary_correction);
+  SktReadKeyword("h_min", s.h_min, def.h_min);
+  if (s.scheme_of_time_integration == 2)
+    SktReadKeyword("maximum_number_of_iterations", s.maximum_number_of_iterations, def.maximum_number_of_iterations);
+  if (!(s.h_min >= 0.0)) FatalError("SetupSolutionMethodTR: h_min must not be negative in " + SktSectionPath());
+  SktCloseSection();
+}
 
 void SetupStructureTR(TrModule& tr, const HdModule& hd, const Mesh& mesh, const RunControl& run,
                       const TimeAxis& time, const ModuleSelection& selection) {
@@ -296,7 +372,7 @@ void SetupPropertyTR(TrModule& tr, const HdModule& hd, const Mesh& mesh) {
     TrComponentData& d = tr.data[k];
 
     int opened = OpenComponentSection("DISPERSION", k);
-    ReadDispersionTR(d.dispersion, hd, mesh, opened == 2);
+    if (opened == 2) ReadDispersion(d, hd, mesh, tr.time_axis);
     CloseSections(opened);
 
     opened = OpenComponentSection("DECAY", k);
@@ -373,11 +449,11 @@ void SetupInitialConditionsTR(TrModule& tr, const HdModule& hd, const Mesh& mesh
       d.initial.values.assign(ne, 0.0);
     }
     CloseSections(opened);
-    try {
-      d.c.assign(ne, 0.0);
-    } catch (const std::bad_alloc&) {
-      OutOfMemory("SetupPropertyTR");
-    }
+    const TrComponent& c = tr.components[k];
+    d.ad.name = c.name;
+    d.ad.minimum = c.minimum_value;
+    d.ad.maximum = c.maximum_value;
+    AllocateComponentAD(hd, d.ad);
   }
 }
 
@@ -390,7 +466,11 @@ void SetupBoundCondTR(TrModule& tr, const HdModule& hd, const Mesh& mesh) {
     TrComponentData& d = tr.data[k];
     try {
       d.codes.assign(bc.ncodes);
-      d.boundary_values.assign(2 * bc.faces.size(), 0.0);
+      d.ad.boundary_type.assign(bc.faces.size(), kAdBoundaryNone);
+      d.ad.boundary_c.assign(bc.faces.size(), 0.0);
+      int nmax = 0;
+      for (int code = 1; code <= bc.ncodes; ++code) nmax = std::max(nmax, bc.codes[code].nfaces);
+      d.work.assign(std::max(nmax, mesh.elements.nelements), 0.0);
     } catch (const std::bad_alloc&) {
       OutOfMemory("SetupBoundCondTR");
     }
@@ -415,12 +495,21 @@ void SetupBoundCondTR(TrModule& tr, const HdModule& hd, const Mesh& mesh) {
                    (hd_type == kBcCyclic ? "cyclic" : "not cyclic") + ", the transport boundary type " +
                    std::to_string(b.type) + " of " + CodeSection(code, k) + " must " +
                    (hd_type == kBcCyclic ? "be" : "not be") + " 6 (cyclic)");
-      if (!open_flow && (b.type == kTrBoundaryValue || b.type == kTrBoundaryValueDispersive) &&
+      if (!open_flow && (b.type == kTrBoundaryValue || b.type == kTrBoundaryAlong) &&
           bc.codes[code].nfaces > 0)
         Warning(CodeSection(code, k) + ": the flow boundary of code " + std::to_string(code) +
                 " is land; its transport data are not used");
     }
     PairCyclicTR(d, bc, mesh, k);
+    // The solver's kind of every face of the flow's face list.
+    for (int code = 1; code <= bc.ncodes; ++code) {
+      const BoundaryCondition& hb = bc.codes[code];
+      const TrBoundaryCode& b = d.codes[code];
+      const int kind = b.type == kTrBoundaryCyclic                                  ? kAdBoundaryCyclic
+                       : b.type == kTrBoundaryValue || b.type == kTrBoundaryAlong ? kAdBoundaryValue
+                                                                                    : kAdBoundaryNone;
+      for (int j = 0; j < hb.nfaces; ++j) d.ad.boundary_type[hb.first_face + j] = kind;
+    }
   }
   if (have_section) SktCloseSection();
 }
