@@ -52,9 +52,9 @@
 //
 // Boundary faces (the HD face list HdBoundary::faces): water leaving carries
 // the element's concentration; water entering carries the component's
-// boundary value (kAdBoundaryValue), the element's own concentration
-// (kAdBoundaryNone, no data) or that of the element behind the partner face
-// of a cyclic pair (kAdBoundaryCyclic).
+// boundary value (kAdBoundaryValue) or the element's own concentration
+// (kAdBoundaryNone, no data); at a face of a cyclic pair of the HD module it
+// carries the concentration of the element behind the partner face.
 //
 // Threads and processes: the face loop writes each face's flux into a face
 // array, the elements gather their faces in local face order (static OpenMP
@@ -122,7 +122,8 @@ struct AdExchange {
 // Kind of a boundary face for the component.
 inline constexpr int kAdBoundaryNone = 0;    // inflow carries the element's concentration
 inline constexpr int kAdBoundaryValue = 1;   // inflow carries boundary_c
-inline constexpr int kAdBoundaryCyclic = 2;  // inflow carries the partner element's concentration
+// (A face that the HD module pairs as cyclic always takes the concentration
+// of the element behind its partner face, whatever its type here.)
 
 // Concentration type of a source's released water.
 inline constexpr int kAdSourceConcentration = 1;  // c_s
@@ -169,7 +170,8 @@ struct AdFlow {
   double dt = 0.0;                 // s
   Array1<double> face_volume;      // per face, m3, positive from element1 to element2 (boundary: outward)
   Array1<double> h_start, h_end;   // per element (owned and halo), m
-  Array1<int> wetdry;              // per element, HD codes at the end of the sub-step
+  Array1<int> wetdry;              // per element, HD codes at the start of the sub-step (the fluxes saw them)
+  Array1<int> wetdry_end;          // per element, HD codes at the end of the sub-step
   Array1<double> precipitation;    // per owned element, volume added (m3)
   Array1<double> evaporation;      // per owned element, volume taken (m3, >= 0)
   Array1<double> cut;              // per owned element, volume added where a negative depth was cut (m3)
@@ -216,45 +218,45 @@ class AdSolver {
   const AdSolutionTechnique& Technique() const { return technique_; }
 
  private:
-  struct Stage;
-  double SubStepRate(const AdFlow& flow, const AdComponent& comp, double n_inv);
-  void SourceRates(const AdFlow& flow, AdComponent& comp, double n_inv);
-  void Gradients(const Array1<double>& c, const Array1<int>& wetdry);
-  void FaceFluxes(const AdFlow& flow, const AdComponent& comp, const Array1<double>& c, double frac, double n_inv,
-                  double weight);
-  void UpdateElements(const AdFlow& flow, AdComponent& comp, int stage, double frac_start, double frac_end,
-                      double n_inv, double weight, bool last);
+  int SubStepCount(const AdFlow& flow, const AdComponent& comp);
+  void SurfaceAndSources(const AdFlow& flow, AdComponent& comp, double n_inv);
+  void Gradients(const AdComponent& comp, const Array1<int>& wetdry);
+  void FaceFluxes(const AdFlow& flow, const AdComponent& comp, double frac, double n_inv, double weight);
+  void UpdateElements(const AdFlow& flow, AdComponent& comp, double alpha, double w, double frac, double n_inv,
+                      double weight, bool sub_end);
 
   const HdModule* hd_ = nullptr;
+  const HdSolver* hd_solver_ = nullptr;  // its interior faces and element face slots
   const Mesh* mesh_ = nullptr;
   Subdomain* subdomain_ = nullptr;
   AdSolutionTechnique technique_;
-  int nowned_ = 0, nlocal_ = 0, nfaces_ = 0;
+  int nowned_ = 0, nlocal_ = 0;
   bool second_ = false;
   double cfl_critical_ = 1.0, dt_min_ = 0.01, dt_max_ = 30.0;
 
-  // Geometry (metres; geographic meshes on the sphere).
-  Array1<int> interior_faces_;         // faces with two elements and an owned side
-  Array1<double> area_;                // per element (m2)
+  // Geometry (metres; on geographic meshes on the sphere).
+  const double* area_ = nullptr;       // per element (m2)
   Array1<double> face_len_;            // per face (m)
-  Array1<double> face_dn_;             // per interior face: centre distance along the normal (m)
-  Array1<double> face_tx_, face_ty_;   // per interior face: n - d / (d.n), for the tangential term (metres)
-  Array1<double> face_ox1_, face_oy1_, face_ox2_, face_oy2_;  // face centre minus each centroid (mesh units)
-  Array1<int> slot_face_side_;         // as HdSolver: 2 f + side per element slot
-  int face_planes_ = 0, plane_stride_ = 0;
+  // Per face: inverse of the centre distance along the normal (1/m); the
+  // tangential vector n - d / (d.n) in gradient units (per mesh unit); the
+  // face centre minus each centroid (mesh units).
+  Array1<double> face_idn_, face_tx_, face_ty_;
+  Array1<double> face_ox1_, face_oy1_, face_ox2_, face_oy2_;
 
   GradientStencil stencil_;
   LimiterGeometry2D limiter_geometry_;
+  Array1<int> no_flags_;  // empty: every face open
 
   // Work arrays.
-  Array1<double> m_base_, m_, c_work_, c_prev_;  // per element
+  Array1<double> m_base_, m_;                    // per element: mass per area at the sub-step start, of the stage
   Array1<double> gx_, gy_, gx_raw_, gy_raw_;     // per element
-  Array1<double> face_flux_;                     // per face: mass through the face over the sub-step
-  Array1<double> source_mass_;                   // per owned element: source mass of the sub-step
-  Array1<double> surface_mass_, decay_mass_, clamp_mass_;  // per owned element, over the step
-  Array1<double> source_sums_;                   // per source: c of the giving element (process sums)
+  Array1<double> face_flux_;                     // per face: mass through it over the sub-step
+  Array1<double> source_mass_;                   // per owned element: mass of sources and surface over the sub-step
+  Array1<double> clamp_step_;                    // per owned element: clamp correction of the step (weighted)
+  Array1<double> decay_step_;                    // per owned element: decay of the step (weighted)
+  Array1<double> source_ambient_;                // per source: c of the giving element (process sums)
+  Array1<double> boundary_mass_;                 // per boundary face condition: mass through it over the step
   Array1<double> cfl_;
-  Array1<double> boundary_in_, boundary_out_;    // per boundary face condition: mass of the step
 };
 
 }  // namespace vhd
