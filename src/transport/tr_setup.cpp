@@ -164,23 +164,36 @@ void ReadBoundaryCode(TrBoundaryCode& b, const HdModule& hd, const Mesh& mesh, i
   }
 }
 
-// Cyclic partners of the codes of component k, paired as the flow's.
+// The partner of cyclic code `code`: code_cyclic when that is another
+// cyclic code, else the first other cyclic code with as many faces; 0 when
+// there is none.
+template <class IsCyclic>
+int CyclicPartner(const HdBoundary& bc, int code, int code_cyclic, IsCyclic is_cyclic) {
+  if (code_cyclic != 0)
+    return code_cyclic >= 1 && code_cyclic <= bc.ncodes && code_cyclic != code && is_cyclic(code_cyclic) ? code_cyclic
+                                                                                                         : 0;
+  for (int p = 1; p <= bc.ncodes; ++p)
+    if (p != code && is_cyclic(p) && bc.codes[p].nfaces == bc.codes[code].nfaces) return p;
+  return 0;
+}
+
+// Cyclic partners of the codes of component k, paired as the flow's (the
+// solver takes the flow's pairs).
 void PairCyclicTR(TrComponentData& d, const HdBoundary& bc, const Mesh& mesh, int k) {
   for (int code = 1; code <= bc.ncodes; ++code) {
     TrBoundaryCode& b = d.codes[code];
     if (b.type != kTrBoundaryCyclic) continue;
-    int partner = 0;
-    if (b.code_cyclic != 0) {
-      const int p = b.code_cyclic;
-      if (p >= 1 && p <= bc.ncodes && p != code && d.codes[p].type == kTrBoundaryCyclic) partner = p;
-    } else {
-      for (int p = 1; p <= bc.ncodes && partner == 0; ++p)
-        if (p != code && d.codes[p].type == kTrBoundaryCyclic && bc.codes[p].nfaces == bc.codes[code].nfaces)
-          partner = p;
-    }
+    const int partner =
+        CyclicPartner(bc, code, b.code_cyclic, [&](int p) { return d.codes[p].type == kTrBoundaryCyclic; });
     if (partner == 0)
       FatalError("SetupBoundCondTR: Cyclic boundary not identified (" + CodeSection(code, k) + ", code_cyclic " +
                  std::to_string(b.code_cyclic) + ")");
+    const int flow_partner = CyclicPartner(bc, code, bc.codes[code].code_cyclic,
+                                           [&](int p) { return bc.codes[p].type == kBcCyclic; });
+    if (partner != flow_partner)
+      FatalError("SetupBoundCondTR: Cyclic boundary not identified (" + CodeSection(code, k) + " pairs code " +
+                 std::to_string(code) + " with code " + std::to_string(partner) + ", the flow with code " +
+                 std::to_string(flow_partner) + ")");
     const BoundaryCondition& mine = bc.codes[code];
     const BoundaryCondition& other = bc.codes[partner];
     if (mine.nfaces != other.nfaces)
@@ -505,9 +518,8 @@ void SetupBoundCondTR(TrModule& tr, const HdModule& hd, const Mesh& mesh) {
     for (int code = 1; code <= bc.ncodes; ++code) {
       const BoundaryCondition& hb = bc.codes[code];
       const TrBoundaryCode& b = d.codes[code];
-      const int kind = b.type == kTrBoundaryCyclic                                  ? kAdBoundaryCyclic
-                       : b.type == kTrBoundaryValue || b.type == kTrBoundaryAlong ? kAdBoundaryValue
-                                                                                    : kAdBoundaryNone;
+      // A cyclic face takes the element behind its partner face as the flow does.
+      const int kind = b.type == kTrBoundaryValue || b.type == kTrBoundaryAlong ? kAdBoundaryValue : kAdBoundaryNone;
       for (int j = 0; j < hb.nfaces; ++j) d.ad.boundary_type[hb.first_face + j] = kind;
     }
   }
