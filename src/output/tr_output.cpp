@@ -1,6 +1,5 @@
 #include "output/tr_output.hpp"
 
-#include <cmath>
 #include <new>
 
 #include "core/omp.hpp"
@@ -190,7 +189,7 @@ void TrItemValues(const TrModule& tr, const HdModule& hd, const Mesh& mesh, int 
   const int ne = mesh.elements.nelements;
   const int nown = Owned(mesh);
   const double* c = code > 0 ? tr.data[code].ad.c.data() : nullptr;
-  const double dt = hd.dt_last;
+  const Array1<double>& cfl = tr.solver.Cfl();
   VHD_OMP_PARALLEL_FOR
   for (int e = 1; e <= nown; ++e) {
     if (flood_and_dry > 0 && (s.wetdry[e] == kDry || (flood_and_dry == 2 && s.wetdry[e] != kWet))) {
@@ -205,7 +204,7 @@ void TrItemValues(const TrModule& tr, const HdModule& hd, const Mesh& mesh, int 
     } else if (code == kTrVVelocity) {
       v = s.v[e];
     } else if (code == kTrCflNumber) {
-      v = s.length[e] > 0.0 ? (std::fabs(s.u[e]) + std::fabs(s.v[e])) * dt / s.length[e] : 0.0;
+      v = e <= cfl.size() ? cfl[e] : 0.0;
     }
     values[e] = v;
   }

@@ -6,8 +6,8 @@
 //   <component name>   the component's concentration, titled with its
 //                      description, item type and unit from its record
 //   U_VELOCITY "U-velocity", V_VELOCITY "V-velocity" (m/s)
-//   CFL_NUMBER "CFL number (AD)": (|u| + |v|) dt / L of the last sub-step,
-//                      L the element length of the flow's CFL number
+//   CFL_NUMBER "CFL number (AD)": the solver's CFL number of its last
+//                      sub-step (advection out of the element and dispersion)
 // Concentrations of dry elements keep their last value (the delete value
 // with flood_and_dry, as the flow items).
 //
