@@ -389,14 +389,13 @@ void SetupPropertyTR(TrModule& tr, const HdModule& hd, const Mesh& mesh) {
     CloseSections(opened);
 
     opened = OpenComponentSection("DECAY", k);
-    const std::string where = "TRANSPORT_MODULE/DECAY/COMPONENT_" + std::to_string(k);
     if (opened == 2) {
       SktReadKeyword("type", d.decay_type, 0);
       if (d.decay_type != 0 && d.decay_type != 1)
         FatalError("Type not supported for decay" + Where("type", d.decay_type));
     }
     if (d.decay_type == 1) {
-      ReadElementFieldHD(d.decay, 0.0, file_index, ne, true, "Format not supported for decay (format in " + where + ")",
+      ReadElementFieldHD(d.decay, 0.0, file_index, ne, true, "Format not supported for decay (format in " + SktSectionPath() + ")",
                          "SetupPropertyTR", tr.time_axis);
     } else {
       d.decay.values.assign(ne, 0.0);
