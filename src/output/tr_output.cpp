@@ -106,15 +106,12 @@ void SetupOutputsTR(TrOutputs& out, const TrModule& tr, const Mesh& mesh, const 
   info.module = "TR";
   info.read_items = ReadItemsTR;
   info.context = &context;
+  info.discharge = false;
   for (int k = 1; k <= tr.number_of_components; ++k) info.budget_components.push_back(tr.components[k].name);
   SktOpenSection("TRANSPORT_MODULE", kNoIndex, nullptr, false);
   SetupOutputs(out.list, info, mesh, run, time);
   SktCloseSection();
   for (const OutputSpec& spec : out.list.outputs) {
-    if (spec.type == kOutputDischarge)
-      FatalError("SpecOutputFileTR: Output type not supported - type 4 (a discharge is an output of the "
-                 "hydrodynamic module) (section " +
-                 spec.section + ")");
     // The solver books what enters through the boundaries and sources over
     // the whole model area, not across the border of a polygon.
     if (spec.type == kOutputMassBudget && !spec.budget.px.empty())
