@@ -255,7 +255,9 @@ void AdSolver::Setup(const HdModule& hd, const HdSolver& hd_solver, const Mesh& 
   const int ne = st.nelements;
   for (Array1<double>* a : {&m_base_, &m_, &gx_, &gy_, &gx_raw_, &gy_raw_}) a->assign(ne, 0.0);
   face_flux_.assign(nf, 0.0);
-  for (Array1<double>* a : {&source_mass_, &clamp_step_, &decay_step_, &cfl_}) a->assign(nowned_, 0.0);
+  for (Array1<double>* a : {&h_base_, &h_}) a->assign(ne, 0.0);
+  for (Array1<double>* a : {&source_mass_, &source_water_, &water_rate_, &clamp_step_, &decay_step_, &cfl_})
+    a->assign(nowned_, 0.0);
   source_ambient_.assign(static_cast<int>(hd.sources.sources.size()), 0.0);
   boundary_mass_.assign(hd.boundary.faces.size(), 0.0);
 }
@@ -314,7 +316,8 @@ int AdSolver::SubStepCount(const AdFlow& flow, const AdComponent& comp) {
 void AdSolver::SurfaceAndSources(const AdFlow& flow, AdComponent& comp, double n_inv) {
   // Precipitation, evaporation and the water of cut depths (carrying the
   // element's concentration) per element, then the point sources, with the
-  // concentrations at the start of the sub-step.
+  // concentrations at the start of the sub-step. The water itself goes into
+  // source_water_ by the same operations with the concentration 1.
   const double* c = comp.c.data();
   VHD_OMP_PARALLEL_FOR
   for (int e = 1; e <= nowned_; ++e) {
@@ -324,6 +327,7 @@ void AdSolver::SurfaceAndSources(const AdFlow& flow, AdComponent& comp, double n
     comp.surface_total[e] += surface;
     comp.drying_total[e] += cut;
     source_mass_[e] = surface + cut;
+    source_water_[e] = n_inv * (flow.precipitation[e] * 1.0 - flow.evaporation[e] * 1.0) + n_inv * flow.cut[e] * 1.0;
   }
 
   const int ns = flow.source_giver.size();
@@ -342,6 +346,7 @@ void AdSolver::SurfaceAndSources(const AdFlow& flow, AdComponent& comp, double n
     if (owned(g) && withdrawn > 0.0) {
       const double mass = withdrawn * c[g];
       source_mass_[g] -= mass;
+      source_water_[g] -= withdrawn * 1.0;
       comp.source_outflow.Add(mass);
     }
     const double released = n_inv * flow.source_released[k];
@@ -352,8 +357,29 @@ void AdSolver::SurfaceAndSources(const AdFlow& flow, AdComponent& comp, double n
       const double ambient = g > 0 ? source_ambient_[k] : c[t];
       const double mass = released * (excess ? cs + ambient : cs);
       source_mass_[t] += mass;
+      source_water_[t] += released * 1.0;
       comp.source_inflow.Add(mass);
     }
+  }
+}
+
+void AdSolver::WaterRates(const AdFlow& flow, double n_inv) {
+  // The depth change per area over the sub-step of every owned element:
+  // the face volumes and the water of the sources, summed exactly as the
+  // element update sums the masses.
+  const HdSolver& hs = *hd_solver_;
+  const int* slots = hs.slot_face_side.data();
+  const int planes = hs.face_planes, stride = hs.plane_stride;
+  const double* vol = flow.face_volume.data();
+  VHD_OMP_PARALLEL_FOR
+  for (int e = 1; e <= nowned_; ++e) {
+    double in = 0.0;
+    for (int j = 0; j < planes; ++j) {
+      const int m = slots[j * stride + e];
+      const double v = n_inv * vol[m >> 1];
+      in += (m & 1) ? v : -v;
+    }
+    water_rate_[e] = (in + source_water_[e]) / area_[e];
   }
 }
 
@@ -449,8 +475,13 @@ void AdSolver::FaceFluxes(const AdFlow& flow, const AdComponent& comp, double fr
 
 void AdSolver::UpdateElements(const AdFlow& flow, AdComponent& comp, double alpha, double w, double frac,
                               double n_inv, double weight, bool sub_end) {
-  // frac: time of the stage's result as a fraction of the HD sub-step;
-  // sub_end: the last stage of a transport sub-step.
+  // The stage advances the mass and, by the same operations, the water
+  // depth carried by the face volumes (so that a uniform concentration has
+  // exactly its mass); c = m / h of that depth. frac: time of the stage's
+  // result as a fraction of the HD sub-step; sub_end: the last stage of a
+  // transport sub-step, where the mass goes back to c times the HD depth
+  // (the difference, round-off and the elements at or below h_min that kept
+  // their concentration, is booked as the drying correction).
   const HdSolver& hs = *hd_solver_;
   const int* slots = hs.slot_face_side.data();
   const int planes = hs.face_planes, stride = hs.plane_stride;
@@ -474,17 +505,15 @@ void AdSolver::UpdateElements(const AdFlow& flow, AdComponent& comp, double alph
     const double k = k_field ? k_field[e] : k_const;
     const double pre = alpha * m_base_[e] + (1.0 - alpha) * m_[e] + w * R;
     const double m = pre / (1.0 + w * dt_sub * k);
-    const double h = h0[e] + frac * (h1[e] - h0[e]);
-    const double mc = std::min(std::max(m, lo * h), hi * h);
+    const double h = alpha * h_base_[e] + (1.0 - alpha) * h_[e] + w * water_rate_[e];
+    // The clamp acts where the element has a concentration (h > h_min).
+    const double mc = h > h_min ? std::min(std::max(m, lo * h), hi * h) : m;
     decay_step_[e] += weight * (pre - m) * A;
     clamp_step_[e] += weight * (mc - m) * A;
     m_[e] = mc;
-    if (h > h_min) {
-      c[e] = mc / h;
-    } else if (sub_end) {
-      // The element keeps its concentration: the mass that this implies.
-      comp.drying_total[e] += (c[e] * h - mc) * A;
-    }
+    h_[e] = h;
+    if (h > h_min) c[e] = mc / h;
+    if (sub_end) comp.drying_total[e] += (c[e] * (h0[e] + frac * (h1[e] - h0[e])) - mc) * A;
   }
 }
 
@@ -506,11 +535,14 @@ int AdSolver::Step(const AdFlow& flow, AdComponent& comp) {
   for (int k = 0; k < n; ++k) {
     const double t0 = k * n_inv;  // start of the sub-step, fraction of the HD sub-step
     SurfaceAndSources(flow, comp, n_inv);
+    WaterRates(flow, n_inv);
     VHD_OMP_PARALLEL_FOR
     for (int e = 1; e <= nowned_; ++e) {
       const double h = flow.h_start[e] + t0 * (flow.h_end[e] - flow.h_start[e]);
       m_base_[e] = comp.c[e] * h;
       m_[e] = m_base_[e];
+      h_base_[e] = h;
+      h_[e] = h;
     }
     double frac_in = 0.0;
     for (int s = 0; s < nstages; ++s) {

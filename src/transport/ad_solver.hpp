@@ -22,7 +22,11 @@
 // negative depth was cut (flooding and drying). These satisfy, element by
 // element, A (h_end - h_start) = sum of those volumes, so a uniform
 // concentration with sources and boundaries of the same concentration stays
-// uniform to round-off. When the transport's own stability condition
+// uniform. The stages advance the water depth with the same volumes and the
+// same operations as the mass (m for c = 1), and c = m / h of that depth, so
+// c = 1 stays 1 to the last bit; at the end of a sub-step the mass is c times
+// the HD depth again (what that moves, round-off and the elements that kept
+// their concentration, is the drying correction). When the transport's own stability condition
 // (CFL_critical_AD, dt_min_AD, dt_max_AD: advection out of the element and
 // explicit dispersion) asks for a shorter step, the HD sub-step is split into
 // n equal transport sub-steps that take 1/n of every volume and the depths
@@ -34,8 +38,8 @@
 //   1 forward Euler;
 //   2 midpoint: half a step to c*, then the full step with R(c*);
 //   3 three-stage strong-stability-preserving Runge-Kutta.
-// After every stage the mass is clamped to [minimum h, maximum h] (the clamp
-// correction records what that adds), then c = m / h where h > h_min; a
+// After every stage, where h > h_min, the mass is clamped to [minimum h,
+// maximum h] (the clamp correction records what that adds) and c = m / h; a
 // shallower element keeps its previous concentration (the mass that this
 // adds or removes is the drying correction).
 //
@@ -220,6 +224,7 @@ class AdSolver {
  private:
   int SubStepCount(const AdFlow& flow, const AdComponent& comp);
   void SurfaceAndSources(const AdFlow& flow, AdComponent& comp, double n_inv);
+  void WaterRates(const AdFlow& flow, double n_inv);
   void Gradients(const AdComponent& comp, const Array1<int>& wetdry);
   void FaceFluxes(const AdFlow& flow, const AdComponent& comp, double frac, double n_inv, double weight);
   void UpdateElements(const AdFlow& flow, AdComponent& comp, double alpha, double w, double frac, double n_inv,
@@ -249,9 +254,11 @@ class AdSolver {
 
   // Work arrays.
   Array1<double> m_base_, m_;                    // per element: mass per area at the sub-step start, of the stage
+  Array1<double> h_base_, h_;                    // per element: water depth carried alike
   Array1<double> gx_, gy_, gx_raw_, gy_raw_;     // per element
   Array1<double> face_flux_;                     // per face: mass through it over the sub-step
   Array1<double> source_mass_;                   // per owned element: mass of sources and surface over the sub-step
+  Array1<double> source_water_, water_rate_;     // per owned element: their water; depth change per area
   Array1<double> clamp_step_;                    // per owned element: clamp correction of the step (weighted)
   Array1<double> decay_step_;                    // per owned element: decay of the step (weighted)
   Array1<double> source_ambient_;                // per source: c of the giving element (process sums)
