@@ -11,7 +11,7 @@ void TrDriverModule::Setup(const ModuleContext& context) {
   run_ = &context.run;
   dt_overall_ = context.time.dt;
   const Mesh& mesh = hd_->mesh();
-  SetupStructureTR(tr_, hd_->hd(), mesh, context.run, context.time, context.selection);
+  SetupStructureTR(tr_, hd_->hd(), mesh, context.time, context.selection);
   SetupOutputsTR(outputs_, tr_, mesh, context.run, context.time);
   SetupSolverTR(tr_, hd_->hd(), hd_->solver(), mesh);
 }

@@ -151,24 +151,22 @@ struct TrModule {
   AdSolver solver;
   AdFlow flow;
   bool started = false;          // the components hold their initial conditions and are advanced
-  double dt_last = 0.0;          // the last transport step (s)
-  long long n_steps = 0, n_substeps = 0;
+  long long n_steps = 0;         // transport steps (one per HD sub-step from the start)
+  long long n_substeps = 0;      // solver sub-steps over all components
 
   TimeAxis time_axis;
-  int process_id = -1;
-  int nprocesses = 1;
   TimingSet timing;
 };
 
 // Reads TRANSPORT_MODULE (up to, not including, OUTPUTS) inside the current
 // section (the target), for the flow of hd on its velocity mesh.
-void SetupStructureTR(TrModule& tr, const HdModule& hd, const Mesh& mesh, const RunControl& run,
-                      const TimeAxis& time, const ModuleSelection& selection);
+void SetupStructureTR(TrModule& tr, const HdModule& hd, const Mesh& mesh, const TimeAxis& time,
+                      const ModuleSelection& selection);
 
 // Section readers called by SetupStructureTR, in this order; each opens its
 // sections inside TRANSPORT_MODULE (the current section).
 void SetupEquationTR(TrModule& tr, const HdModule& hd, const TimeAxis& time, int ndim);
-void SetupSolutionMethodTR(TrModule& tr, const HdModule& hd);
+void SetupSolutionMethodTR(TrModule& tr);
 void SetupPropertyTR(TrModule& tr, const HdModule& hd, const Mesh& mesh);
 void SetupInitialConditionsTR(TrModule& tr, const HdModule& hd, const Mesh& mesh);
 void SetupBoundCondTR(TrModule& tr, const HdModule& hd, const Mesh& mesh);

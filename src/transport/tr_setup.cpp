@@ -30,9 +30,8 @@ std::string Where(std::string_view key, long long value) {
 // their defaults).
 int OpenComponentSection(std::string_view name, int k) {
   if (!OpenOptionalSectionHD(name)) return 0;
-  int status = 0;
   if (SktSectionExists("COMPONENT", k)) {
-    SktOpenSection("COMPONENT", k, &status);
+    SktOpenSection("COMPONENT", k);
     return 2;
   }
   return 1;
@@ -85,16 +84,15 @@ void ReadComponent(TrComponent& c, int k, bool section_open) {
   }
 }
 
-// A time-varying value of water that enters or leaves (precipitation,
-// evaporation, infiltration) on the elements.
+// A time-varying value of water that enters or leaves (what: "precipitation",
+// "evaporation", "infiltration") on the elements.
 void ReadWaterConcentration(TrWaterConcentration& w, std::string_view type_key, std::string_view section,
-                            const std::string& format_message, const Mesh& mesh, const TimeAxis& time) {
+                            const std::string& what, const std::string& format_message, const Mesh& mesh,
+                            const TimeAxis& time) {
   SktReadKeyword(type_key, w.type, 1);
   if (w.type != kAdExchangeNothing && w.type != kAdExchangeValue && w.type != kAdExchangeAmbient)
-    FatalError("Type not supported for " + std::string(section == "PRECIPITATION"   ? "precipitation"
-                                                       : section == "EVAPORATION" ? "evaporation"
-                                                                                  : "infiltration") +
-               Where(type_key, w.type));
+    FatalError("Type not supported for " + what + Where(type_key, w.type) +
+               "; 0 nothing, 1 the given value, 2 the element's concentration");
   InitDataSpec(w.data, 1);
   if (w.type != kAdExchangeValue) return;
   const bool open = OpenOptionalSectionHD(section);
@@ -270,7 +268,7 @@ void ReadDispersion(TrComponentData& d, const HdModule& hd, const Mesh& mesh, co
 
 }  // namespace
 
-void SetupSolutionMethodTR(TrModule& tr, const HdModule& /*hd*/) {
+void SetupSolutionMethodTR(TrModule& tr) {
   AdSolutionTechnique& s = tr.solution;
   if (!OpenOptionalSectionHD("SOLUTION_TECHNIQUE")) return;
   const AdSolutionTechnique def;
@@ -292,11 +290,9 @@ void SetupSolutionMethodTR(TrModule& tr, const HdModule& /*hd*/) {
   SktCloseSection();
 }
 
-void SetupStructureTR(TrModule& tr, const HdModule& hd, const Mesh& mesh, const RunControl& run,
-                      const TimeAxis& time, const ModuleSelection& selection) {
+void SetupStructureTR(TrModule& tr, const HdModule& hd, const Mesh& mesh, const TimeAxis& time,
+                      const ModuleSelection& selection) {
   tr.time_axis = time;
-  tr.process_id = run.process_id;
-  tr.nprocesses = run.nprocesses;
   tr.ndim = selection.ndim;
   SktOpenSection("TRANSPORT_MODULE");
   SktReadKeyword("mode", tr.mode, 0);
@@ -304,7 +300,7 @@ void SetupStructureTR(TrModule& tr, const HdModule& hd, const Mesh& mesh, const 
     FatalError("mode is illegal (mode = " + std::to_string(tr.mode) + " in " + SktSectionPath() +
                ", mode_of_transport_module = " + std::to_string(selection.tr) + ")");
   SetupEquationTR(tr, hd, time, selection.ndim);
-  SetupSolutionMethodTR(tr, hd);
+  SetupSolutionMethodTR(tr);
   SetupPropertyTR(tr, hd, mesh);
   SetupInitialConditionsTR(tr, hd, mesh);
   SetupBoundCondTR(tr, hd, mesh);
@@ -405,9 +401,9 @@ void SetupPropertyTR(TrModule& tr, const HdModule& hd, const Mesh& mesh) {
     opened = OpenComponentSection("PRECIPITATION_EVAPORATION", k);
     d.precipitation.type = d.evaporation.type = 1;
     if (opened == 2) {
-      ReadWaterConcentration(d.precipitation, "type_of_precipitation", "PRECIPITATION",
+      ReadWaterConcentration(d.precipitation, "type_of_precipitation", "PRECIPITATION", "precipitation",
                              "Format not supported for precipitation", mesh, tr.time_axis);
-      ReadWaterConcentration(d.evaporation, "type_of_evaporation", "EVAPORATION",
+      ReadWaterConcentration(d.evaporation, "type_of_evaporation", "EVAPORATION", "evaporation",
                              "Format not supported for evaporation", mesh, tr.time_axis);
     } else {
       InitDataSpec(d.precipitation.data, 1);
@@ -418,7 +414,7 @@ void SetupPropertyTR(TrModule& tr, const HdModule& hd, const Mesh& mesh) {
     opened = OpenComponentSection("INFILTRATION", k);
     d.infiltration.type = 1;
     if (opened == 2) {
-      ReadWaterConcentration(d.infiltration, "type_of_infiltration", "INFILTRATION",
+      ReadWaterConcentration(d.infiltration, "type_of_infiltration", "INFILTRATION", "infiltration",
                              "Format not supported for infiltration.", mesh, tr.time_axis);
     } else {
       InitDataSpec(d.infiltration.data, 1);

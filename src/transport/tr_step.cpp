@@ -71,9 +71,11 @@ void SetupSolverTR(TrModule& tr, const HdModule& hd, const HdSolver& hd_solver, 
     }
     // Array sizes of the time-varying inputs are fixed here: the loop does
     // not allocate.
-    for (TrWaterConcentration* w : {&d.precipitation, &d.evaporation})
-      if (w->type == kAdExchangeValue && w->data.format != kDataConstant)
-        (w == &d.precipitation ? ad.precipitation : ad.evaporation).values.assign(mesh.elements.nelements, 0.0);
+    auto size = [&](const TrWaterConcentration& w, AdExchange& ex) {
+      if (w.type == kAdExchangeValue && w.data.format != kDataConstant) ex.values.assign(mesh.elements.nelements, 0.0);
+    };
+    size(d.precipitation, ad.precipitation);
+    size(d.evaporation, ad.evaporation);
   }
 }
 
@@ -109,7 +111,6 @@ void StepTR(TrModule& tr, const HdModule& hd, const HdSolver& hd_solver, const M
   }
   StopTiming(tr.timing, kTrTimerSolve);
   ++tr.n_steps;
-  tr.dt_last = dt;
   StopTiming(tr.timing, kTrTimerTotal);
 }
 

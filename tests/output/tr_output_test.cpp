@@ -33,7 +33,7 @@ TEST_P(TransportOutputMessages, StopsTheRun) {
         f.modules.tr = 2;
         f.Setup(body, mesh);
         TrModule tr;
-        SetupStructureTR(tr, f.hd, mesh, f.run, f.time, f.modules);
+        SetupStructureTR(tr, f.hd, mesh, f.time, f.modules);
         TrOutputs out;
         SetupOutputsTR(out, tr, mesh, f.run, f.time);
       },

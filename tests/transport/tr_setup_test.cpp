@@ -48,7 +48,7 @@ class TrSetupFixture : public HdSetupFixture {
     Setup(body, mesh);
     ModuleSelection selection = modules;
     selection.ndim = ndim_tr;
-    SetupStructureTR(tr, hd, mesh, run, time, selection);
+    SetupStructureTR(tr, hd, mesh, time, selection);
   }
   TrModule tr;
 };
