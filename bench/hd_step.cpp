@@ -18,64 +18,16 @@
 #include <memory>
 #include <vector>
 
+#include "hd_case.hpp"
 #include "core/omp.hpp"
 #include "hydro/hd_module.hpp"
-#include "hydro/sw_fluxes.hpp"
 #include "hydro/time_step.hpp"
 #include "log/log.hpp"
-#include "mesh/generate.hpp"
 #include "mesh/mesh.hpp"
 
 namespace {
 
 using namespace vhd;
-
-struct Case {
-  Mesh mesh;
-  HdModule hd;
-  HdSolver solver;
-};
-
-// A square basin of random jittered triangles (2 n^2 elements) with a
-// sloping bed and a tilted surface, so that every face carries flow.
-std::unique_ptr<Case> MakeCase(int elements, int order) {
-  auto c = std::make_unique<Case>();
-  RectangleMeshSpec spec;
-  const int n = static_cast<int>(std::lround(std::sqrt(elements / 2.0)));
-  spec.nx = spec.ny = n;
-  spec.x1 = spec.y1 = n * 10.0;
-  spec.layout = CellLayout::kRandomTriangles;
-  spec.jitter = 0.2;
-  spec.bed = [](double x, double) { return -5.0 - 1e-4 * x; };
-  GenerateRectangleMesh(spec, c->mesh);
-  SetupMeshGeometry(c->mesh);
-  HdModule& hd = c->hd;
-  hd.bed.type = kBedNone;
-  hd.eddy.horizontal.type = kEddyNone;
-  hd.time_step.dt_max_HD = 1e9;
-  // The engine's usual setting; the cost per element-stage does not depend on it.
-  hd.time_step.CFL_critical_HD = 0.8;
-  hd.flood_dry.elevation_limit = 1e6;
-  HdSolutionTechnique& s = hd.solution;
-  s.type_of_Riemann_solver = 1;
-  s.scheme_of_space_discretization_horizontal = order;
-  s.scheme_of_time_integration = order;
-  s.face_value_limiter = order == 2 ? 2 : 0;
-  s.gradient_limiter = order == 2 ? 3 : 0;
-  s.preserve_dU = order == 2;
-  s.face_average_d = order == 2 ? 1 : 0;
-  s.face_limit_dry = order == 2;
-  AllocateStateHD(hd, c->mesh);
-  HdState& st = hd.state;
-  for (int e = 1; e <= st.nelements; ++e) {
-    st.eta[e] = 0.1 * std::sin(c->mesh.elements.xc[e] / spec.x1 * 6.283);
-    st.h[e] = st.eta[e] + st.d[e];
-  }
-  InitialFloodDryCodesHD(hd, c->mesh);
-  SetupSolverHD(hd, c->mesh, c->solver);
-  InitialStepHD(hd, c->solver, c->mesh);
-  return c;
-}
 
 // Triad a = b + s c over arrays far larger than the caches (GB/s, counting
 // 3 x 8 bytes per entry).
@@ -106,7 +58,7 @@ void BM_HdStep(benchmark::State& state) {
   const int threads = static_cast<int>(state.range(2));
   OmpSetThreads(threads);
   const double triad = TriadBandwidth();
-  auto c = MakeCase(elements, order);
+  auto c = bench::MakeHdCase(elements, order);
   int status = 0;
   double t = 0;
   const std::clock_t cpu0 = std::clock();  // CPU time of every thread of the process

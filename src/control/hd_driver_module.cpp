@@ -53,6 +53,7 @@ void HdDriverModule::CloseOutputs() { CloseOutputFilesHD(outputs_); }
 void HdDriverModule::CloseInputs() {
   CloseBoundaryDataHD(hd_.boundary);
   ClosePrecipitationHD(hd_.precipitation);
+  CloseForcingDataHD(hd_);
   CloseSourcesHD(hd_);
 }
 

@@ -224,6 +224,7 @@ void PrepareForcingHD(HdModule& hd, const Mesh& mesh, HdSolver& solver) {
     PrepareCoriolis(hd, mesh, cart);
     if (fc.wind.type > 0) PrepareWind(hd, mesh, cart);
     if (fc.tide.type > 0) PrepareTide(hd, mesh, cart);
+    PrepareForcingFieldsHD(hd, solver, ne);
     PrepareGradient(fc, mesh, st.nelements_local > 0 ? st.nelements_local : ne);
     BoundaryForcingFields& ff = hd.boundary.forcing;
     for (Array1<double>* a : {&ff.coriolis, &ff.wind_x, &ff.wind_y, &ff.pressure_x, &ff.pressure_y,
@@ -249,8 +250,16 @@ void UPDATEWIND(HdModule& hd, double t) {
   w.soft = s;
   if (w.format != 3) {
     const bool constant = w.format == 0;
-    const double speed = s * (constant ? w.constant_speed : FemDataValue(w.data, 1, t));
-    const double direction = constant ? w.constant_direction : FemDataValue(w.data, 2, t);
+    double speed_read = constant ? w.constant_speed : FemDataValue(w.data, 1, t);
+    double direction = constant ? w.constant_direction : FemDataValue(w.data, 2, t);
+    // A series without a value at t (its delete value, or a step pair with
+    // one) gives calm air, as a map does: the delete value is no wind.
+    const double del = w.data.state.open ? w.data.state.file.delete_value : kZrnDefaultDeleteValue;
+    if (!constant && (!MapValueGiven(speed_read, del) || !MapValueGiven(direction, del))) {
+      speed_read = 0.0;
+      direction = 0.0;
+    }
+    const double speed = s * speed_read;
     WindComponentsHD(speed, direction, w.u, w.v);
     w.stress_factor = WindFrictionHD(w, speed) / kWaterOverAirDensity * speed;
     return;
@@ -273,8 +282,11 @@ void UpdateForcingHD(HdModule& hd, HdSolver& solver, const Mesh& mesh, double t,
   if (!fc.prepared) return;
   HdState& st = hd.state;
   BoundaryForcingFields& ff = hd.boundary.forcing;
+  UpdateDepthCorrectionHD(hd, solver, t);
   if (fc.wind.type > 0) UPDATEWIND(hd, t);
+  UpdateIceHD(hd, t);
   if (fc.tide.type > 0) UPDATETIDE(hd, t);
+  UpdateRadiationStressHD(hd, t);
 
   const int nown = st.nelements_owned;
   const ElementTable& E = mesh.elements;
@@ -282,6 +294,7 @@ void UpdateForcingHD(HdModule& hd, HdSolver& solver, const Mesh& mesh, double t,
   const bool pressure = wind && fc.wind.format == 3;
   const bool tide = fc.tide.type > 0;
   const bool coriolis = fc.coriolis.type > 0;
+  const int waves = fc.radiation.type;
   const double g = kPhysical.g, rho = kPhysical.rho0;
   // Wind in thin water: scaled down by h^2 / (2 h_mass)^2 below 2 h_mass.
   const double hc = hd.flood_dry.type > 0 ? hd.flood_dry.mass_depth : 0.0;
@@ -303,6 +316,13 @@ void UpdateForcingHD(HdModule& hd, HdSolver& solver, const Mesh& mesh, double t,
   const double* eq = fc.tide.eta_eq.data();
   double *tx = fc.tide.grad_x.data(), *ty = fc.tide.grad_y.data();
   const double* f = fc.coriolis.f.data();
+  // Ice shelters the water from the wind by a factor on the wind components.
+  const bool sheltered = wind && fc.ice.Concentration();
+  const double* shelter = fc.ice.wind_factor.data();
+  const HdRadiationStress& rs = fc.radiation;
+  const double *sxx = rs.sxx.data(), *sxy = rs.sxy.data(), *syy = rs.syy.data();
+  const double *fx = rs.fx.data(), *fy = rs.fy.data();
+  double *rx = ff.radiation_x.data(), *ry = ff.radiation_y.data();
   double *src_P = solver.src_P.data(), *src_Q = solver.src_Q.data();
   VHD_OMP_PARALLEL_FOR
   for (int e = 1; e <= nown; ++e) {
@@ -313,10 +333,11 @@ void UpdateForcingHD(HdModule& hd, HdSolver& solver, const Mesh& mesh, double t,
     if (wind) {
       const double ca = turn ? nc[e] : 1.0, sa = turn ? ns[e] : 0.0;
       double tx_w, ty_w;
-      if (map) {
-        const bool calm = !MapValueGiven(mu[e], del) || !MapValueGiven(mv[e], del);
-        const double u = calm ? 0.0 : ws * (mu[e] * ca + mv[e] * sa);
-        const double v = calm ? 0.0 : ws * (mv[e] * ca - mu[e] * sa);
+      const double a = sheltered ? shelter[e] : 1.0;
+      if (map || a < 1.0) {
+        const bool calm = map && (!MapValueGiven(mu[e], del) || !MapValueGiven(mv[e], del));
+        const double u = calm ? 0.0 : a * (map ? ws * (mu[e] * ca + mv[e] * sa) : wu * ca + wv * sa);
+        const double v = calm ? 0.0 : a * (map ? ws * (mv[e] * ca - mu[e] * sa) : wv * ca - wu * sa);
         const double speed = std::sqrt(u * u + v * v);
         const double c = WindFrictionHD(w, speed) / kWaterOverAirDensity * speed;
         tx_w = c * u, ty_w = c * v;
@@ -324,6 +345,18 @@ void UpdateForcingHD(HdModule& hd, HdSolver& solver, const Mesh& mesh, double t,
         tx_w = wc * (wu * ca + wv * sa), ty_w = wc * (wv * ca - wu * sa);
       }
       wx[e] = tx_w, wy[e] = ty_w;
+    }
+    if (waves == 1) {
+      // CALCRADIATIONSTRESS: F = -div S.
+      double xx_x, xx_y, xy_x, xy_y, yy_x, yy_y;
+      Gradient(fc, E, sxx, e, xx_x, xx_y);
+      Gradient(fc, E, sxy, e, xy_x, xy_y);
+      Gradient(fc, E, syy, e, yy_x, yy_y);
+      rx[e] = -(xx_x + xy_y) / rho;
+      ry[e] = -(xy_x + yy_y) / rho;
+    } else if (waves == 3) {
+      rx[e] = fx[e] / rho;
+      ry[e] = fy[e] / rho;
     }
     if (code[e] == kWet) {
       if (wind) {
@@ -338,6 +371,10 @@ void UpdateForcingHD(HdModule& hd, HdSolver& solver, const Mesh& mesh, double t,
       if (tide) {
         sx += g * he * tx[e];
         sy += g * he * ty[e];
+      }
+      if (waves > 0) {
+        sx += rx[e];
+        sy += ry[e];
       }
       if (coriolis) {
         // Crank-Nicolson rotation by a = f dt: c - 1 = -a^2/2 / (1 + a^2/4).

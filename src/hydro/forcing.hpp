@@ -13,6 +13,7 @@
 //            scaled by h^2 / (2 h_mass)^2 in water thinner than 2 h_mass;
 //   pressure -h / rho0 grad(p_air);
 //   tide     +g h grad(eta_eq);
+//   waves    the radiation-stress force over rho0 (see HdRadiationStress);
 //   Coriolis the rotation of (P, Q) by the angle f dt in the Crank-Nicolson
 //            (Cayley) form, written as a source: ((c - 1) P + s Q) / dt and
 //            ((c - 1) Q - s P) / dt with c = (1 - a^2/4) / (1 + a^2/4),
@@ -36,6 +37,7 @@
 #include <vector>
 
 #include "core/array1.hpp"
+#include "hydro/element_field.hpp"
 #include "io/dataspec.hpp"
 
 namespace vhd {
@@ -123,10 +125,63 @@ struct HdTidalPotential {
   Array1<double> grad_x, grad_y;  // gradient of eta_eq (-)
 };
 
+// DEPTH: a time-varying correction k (m) of the bed per element, written to
+// HdSolver::depth_correction, which the face terms read: the bed and the
+// surface that drives the flow are raised by k over the water column h, so
+// that the pressure and bed-slope terms see the surface eta + k (a lake at
+// rest has eta + k uniform) while the water held stays h. Formats: 0 a
+// constant (constant_value), 1 and 3 a file read at every time (a point
+// series for the whole mesh or a map), 2 a file read once.
+struct HdDepthCorrection {
+  int type = 0;  // 0 none, >= 1 correction included
+  DataSpec data;
+};
+
+// ICE: concentration (fraction) and/or thickness (m) per element. The
+// concentration shelters the water from the wind: up to c_cut_off_lower the
+// wind acts fully, above c_cut_off not at all, in between its components are
+// scaled by sqrt(1 - (c - c_l) / (c_u - c_l)). An ice-covered element (thickness
+// above thickness_cut_off; without thickness data, a concentration above
+// c_cut_off) has the surface drag c_f,s = K_s / h^(1/3) of the ice roughness
+// (subsection ROUGHNESS: roughness height k_s, K_s = g k_s^(1/3) / 25.4^2).
+struct HdIce {
+  int type = 0;  // 0 none, 1 concentration, 2 thickness, 3 both
+  double thickness_cut_off = 1e-6;
+  double c_cut_off = 0.9, c_cut_off_lower = 0.9;
+  // Components of data: concentration (types 1, 3) first, then thickness
+  // (types 2, 3); formats as for DEPTH.
+  DataSpec data;
+  int roughness_type = 0;  // 0 roughness height k_s (m)
+  ElementField roughness;
+  // Per element: the values read, the wind factor (1 open water, 0 no wind)
+  // and the ice-cover factor (1 covered, 0 open) of the last update.
+  Array1<double> concentration, thickness, wind_factor, cover;
+  bool Concentration() const { return type == 1 || type == 3; }
+  bool Thickness() const { return type == 2 || type == 3; }
+};
+
+// RADIATION_STRESS: type 1 reads the wave radiation stresses Sxx, Sxy, Syy
+// (N/m), type 3 the force components (N/m2), from a map varying in time and
+// domain (format 3), brought up from 0 by a sine soft start over
+// soft_time_interval. The momentum term of a wet element is the force over
+// rho0: -(dSxx/dx + dSxy/dy, dSxy/dx + dSyy/dy) / rho0 for type 1, with the
+// face-difference gradient of the other forcings (a uniform stress gives no
+// force), the components as read over rho0 for type 3.
+struct HdRadiationStress {
+  int type = 0;  // 0 none, 1 stresses, 3 force components
+  int format = 1;
+  DataSpec data;
+  Array1<double> sxx, sxy, syy;  // type 1 (N/m)
+  Array1<double> fx, fy;         // type 3 (N/m2)
+};
+
 struct HdForcing {
   HdWindForcing wind;
   HdCoriolis coriolis;
   HdTidalPotential tide;
+  HdDepthCorrection depth;
+  HdIce ice;
+  HdRadiationStress radiation;
   // Gradient weights, in the element face layout of the mesh (face_start):
   // the neighbour across (0 on the boundary or beyond the local mesh) and
   // n_x len / (2 A), n_y len / (2 A) out of the element (1/m).
@@ -143,6 +198,12 @@ struct HdForcing {
 void SetupCoriolisHD(HdModule& hd);
 void SetupWindHD(HdModule& hd);
 void SetupTideHD(HdModule& hd);
+// DEPTH ("SetupDepth do not support discretization=1" with separate meshes),
+// ICE and RADIATION_STRESS; their data files are opened on the mesh.
+void SetupDepthHD(HdModule& hd, const Mesh& mesh);
+void SetupIceHD(HdModule& hd, const Mesh& mesh);
+void SetupRadiationStressHD(HdModule& hd, const Mesh& mesh);
+void CloseForcingDataHD(HdModule& hd);
 
 // Whether any of the forcings is on.
 bool ForcingActiveHD(const HdModule& hd);
@@ -153,10 +214,15 @@ bool ForcingActiveHD(const HdModule& hd);
 // projection"). Does nothing when no forcing is on.
 void PrepareForcingHD(HdModule& hd, const Mesh& mesh, HdSolver& solver);
 
+// The arrays of the depth correction, ice and radiation stress for ne
+// elements (from PrepareForcingHD).
+void PrepareForcingFieldsHD(HdModule& hd, HdSolver& solver, int ne);
+
 // ---- update -------------------------------------------------------------------
 
 // Forcings at time t (s since the simulation start) for a sub-step of dt:
-// wind, tide, then the momentum sources of the owned elements.
+// depth correction, wind, ice, tide, radiation stress, then the momentum
+// sources of the owned elements.
 void UpdateForcingHD(HdModule& hd, HdSolver& solver, const Mesh& mesh, double t, double dt);
 
 // Wind (UPDATEWIND) at time t: soft start; one wind and stress factor for
@@ -165,6 +231,16 @@ void UpdateForcingHD(HdModule& hd, HdSolver& solver, const Mesh& mesh, double t,
 void UPDATEWIND(HdModule& hd, double t);
 // Tide (UPDATETIDE): the equilibrium tide of the owned elements at time t.
 void UPDATETIDE(HdModule& hd, double t);
+// Depth correction k at time t into solver.depth_correction (every local
+// element: the faces read the neighbours' k).
+void UpdateDepthCorrectionHD(HdModule& hd, HdSolver& solver, double t);
+// Ice at time t: concentration and thickness, the wind and ice-cover factors
+// of the owned elements, and the surface drag of the state at its start.
+void UpdateIceHD(HdModule& hd, double t);
+// Wind factor of ice concentration c between the cut-offs c_l <= c_u.
+double IceWindFactor(double c, double c_l, double c_u);
+// Radiation-stress fields at time t (every local element).
+void UpdateRadiationStressHD(HdModule& hd, double t);
 
 // Pieces shared with the checks.
 // Wind friction coefficient c at wind speed W.

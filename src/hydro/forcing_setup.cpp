@@ -1,17 +1,20 @@
 // Setup of the forcings: the sections CORIOLIS, WIND_FORCING (with
-// WIND_FRICTION) and TIDAL_POTENTIAL of the HD module, their checks and
-// messages.
+// WIND_FRICTION), TIDAL_POTENTIAL, DEPTH, ICE (with ROUGHNESS) and
+// RADIATION_STRESS of the HD module, their checks and messages.
 
 #include <algorithm>
 #include <array>
 #include <cmath>
 #include <string>
+#include <vector>
 
 #include "hydro/forcing.hpp"
 #include "hydro/hd_module.hpp"
 #include "hydro/hd_setup_fields.hpp"
 #include "io/setup.hpp"
 #include "log/log.hpp"
+#include "mesh/femdata.hpp"
+#include "mesh/mesh.hpp"
 
 namespace vhd {
 
@@ -29,11 +32,50 @@ std::string Text(double v) {
   return t.substr(std::min(t.find_first_not_of(' '), t.size()));
 }
 
+// Reads the data keys of a field of n components from the current section:
+// format (default 0); for format 0 constant_value (n = 1) or constant_values
+// (default 0); for formats 1 to 3 file_name and one item key per component
+// (defaults 1, 2, ...). Any other format stops the run with format_message.
+// No soft start.
+void ReadFieldData(DataSpec& spec, const std::vector<const char*>& item_keys, const std::string& format_message) {
+  const int n = static_cast<int>(item_keys.size());
+  InitDataSpec(spec, n);
+  SktReadKeyword("format", spec.format, kDataConstant);
+  if (spec.format < kDataConstant || spec.format > kDataFileMap) {
+    FatalError(format_message + Where("format", Text(spec.format), "0 constant, 1 or 3 read at every time, 2 read once"));
+  }
+  if (spec.format == kDataConstant) {
+    if (n == 1) {
+      SktReadKeyword("constant_value", spec.constant_values[1], 0.0);
+    } else {
+      std::vector<double> v(static_cast<std::size_t>(n), 0.0);
+      SktReadKeyword("constant_values", v, n, v);
+      for (int k = 1; k <= n; ++k) spec.constant_values[k] = v[static_cast<std::size_t>(k - 1)];
+    }
+  } else {
+    SktReadFileName("file_name", spec.file_name, std::string());
+    if (spec.file_name.empty()) FatalError("Missing data file name: keyword file_name in section " + SktSectionPath());
+    for (int k = 1; k <= n; ++k) SktReadKeyword(item_keys[static_cast<std::size_t>(k - 1)], spec.item_numbers[k], k);
+  }
+  spec.type_of_soft_start = kSoftStartNone;
+}
+
+// Opens the data of a field on the elements of the mesh: a point series
+// gives one value for the whole mesh, a grid or mesh file one per element.
+void OpenElementData(HdModule& hd, const Mesh& mesh, DataSpec& spec) {
+  FemDataRequest request;
+  request.expect = FemDataExpect::kArea;
+  request.location = FemDataLocation::kElements;
+  request.mesh = &mesh;
+  FemDataOpen(spec, request, hd.time_axis);
+}
+
 }  // namespace
 
 bool ForcingActiveHD(const HdModule& hd) {
   const HdForcing& f = hd.forcing;
-  return f.wind.type > 0 || f.coriolis.type > 0 || f.tide.type > 0;
+  return f.wind.type > 0 || f.coriolis.type > 0 || f.tide.type > 0 || f.depth.type > 0 || f.ice.type > 0 ||
+         f.radiation.type > 0;
 }
 
 void SetupCoriolisHD(HdModule& hd) {
@@ -216,6 +258,137 @@ void SetupTideHD(HdModule& hd) {
   SktCloseSection();
   tp.amp.assign(tp.constituents.size(), 0.0);
   tp.arg.assign(tp.constituents.size(), 0.0);
+}
+
+void SetupDepthHD(HdModule& hd, const Mesh& mesh) {
+  HdDepthCorrection& dc = hd.forcing.depth;
+  dc.type = 0;
+  if (!OpenOptionalSectionHD("DEPTH")) return;
+  SktReadKeyword("type", dc.type, 0);
+  if (dc.type < 0) FatalError("Type not supported" + Where("type", Text(dc.type), "0 none, 1 or more: depth correction"));
+  if (dc.type == 0) {
+    SktSkipSection();
+    SktCloseSection();
+    return;
+  }
+  // One correction per element of the mesh: not with separate geometry,
+  // velocity and elevation meshes.
+  if (hd.mesh_flag == 1) FatalError("SetupDepth do not support discretization=1 (separate 2D meshes in SPACE)");
+  ReadFieldData(dc.data, {"item_number"}, "Format not supported");
+  SktCloseSection();
+  if (dc.data.format != kDataConstant) OpenElementData(hd, mesh, dc.data);
+}
+
+void SetupIceHD(HdModule& hd, const Mesh& mesh) {
+  HdIce& ice = hd.forcing.ice;
+  ice.type = 0;
+  hd.ice_type = 0;
+  if (!OpenOptionalSectionHD("ICE")) return;
+  SktReadKeyword("type", ice.type, 0);
+  if (ice.type == 0) {
+    SktSkipSection();
+    SktCloseSection();
+    return;
+  }
+  if (ice.type < 0 || ice.type > 3) {
+    FatalError("Type not supported for ice conditions." +
+               Where("type", Text(ice.type), "1 concentration, 2 thickness, 3 concentration and thickness"));
+  }
+  hd.ice_type = ice.type;
+  if (ice.Thickness()) {
+    SktReadKeyword("thickness_cut_off", ice.thickness_cut_off, 1e-6);
+    if (!(ice.thickness_cut_off >= 0.0)) {
+      FatalError("SetupIceHD: the thickness cut-off must not be negative" +
+                 Where("thickness_cut_off", Text(ice.thickness_cut_off)));
+    }
+  }
+  SktReadKeyword("c_cut_off", ice.c_cut_off, 0.9);
+  SktReadKeyword("c_cut_off_lower", ice.c_cut_off_lower, ice.c_cut_off);
+  if (!(ice.c_cut_off_lower <= ice.c_cut_off)) {
+    FatalError("Illegal lower cut off value (c_cut_off_lower = " + Text(ice.c_cut_off_lower) + " exceeds c_cut_off = " +
+               Text(ice.c_cut_off) + " in " + SktSectionPath() + ")");
+  }
+  std::vector<const char*> items;
+  if (ice.Concentration()) items.push_back("item_number_concentration");
+  if (ice.Thickness()) items.push_back("item_number_thickness");
+  ReadFieldData(ice.data, items, "Format not supported for ice conditions.");
+  // The ice roughness: a roughness height, 0 (no surface drag) by default.
+  ElementField& r = ice.roughness;
+  r.format = 0;
+  r.constant_value = 0.0;
+  const int ne = mesh.elements.nelements;
+  if (OpenOptionalSectionHD("ROUGHNESS")) {
+    SktReadKeyword("type", ice.roughness_type, 0);
+    if (ice.roughness_type != 0) {
+      FatalError("SetupIceHD: the ice roughness type is not supported" +
+                 Where("type", Text(ice.roughness_type), "0: roughness height in m"));
+    }
+    ReadElementFieldHD(r, 0.0, hd.state.element_file_index, ne, true, "Format not supported for roughness.",
+                       "SetupIceHD", hd.time_axis);
+    SktCloseSection();
+  } else {
+    r.values.assign(ne, 0.0);
+  }
+  for (int e = 1; e <= ne; ++e) {
+    if (!(r.values[e] >= 0.0)) {
+      FatalError("SetupIceHD: the ice roughness of element " + std::to_string(mesh.elements.id[e]) + " is " +
+                 Text(r.values[e]) + " m (a roughness height must not be negative)");
+    }
+  }
+  SktCloseSection();
+  if (ice.data.format != kDataConstant) OpenElementData(hd, mesh, ice.data);
+}
+
+void SetupRadiationStressHD(HdModule& hd, const Mesh& mesh) {
+  HdRadiationStress& rs = hd.forcing.radiation;
+  rs.type = 0;
+  if (!OpenOptionalSectionHD("RADIATION_STRESS")) return;
+  SktReadKeyword("type", rs.type, 0);
+  if (rs.type == 0) {
+    SktSkipSection();
+    SktCloseSection();
+    return;
+  }
+  if (rs.type < 0 || rs.type > 5) {
+    FatalError("Type not supported for radiation stress variation." +
+               Where("type", Text(rs.type), "1 stresses or 3 force components from a file"));
+  }
+  if (rs.type != 1 && rs.type != 3) {
+    FatalError("SetupHD: Radiation stress from the wave module is not available in this build" +
+               Where("type", Text(rs.type), "1 stresses or 3 force components from a file"));
+  }
+  SktReadKeyword("format", rs.format, 1);
+  if (rs.format != kDataFileMap) {
+    FatalError("Format not supported for radiation stress." + Where("format", Text(rs.format), "3 varying in time and domain"));
+  }
+  DataSpec& d = rs.data;
+  InitDataSpec(d, rs.type == 1 ? 3 : 2);
+  d.format = kDataFileMap;
+  SktReadKeyword("soft_time_interval", d.soft_time_interval, 0.0);
+  if (!(d.soft_time_interval >= 0.0)) {
+    FatalError("SetupRadiationStressHD: the soft time interval must not be negative" +
+               Where("soft_time_interval", Text(d.soft_time_interval)));
+  }
+  d.type_of_soft_start = kSoftStartSine;
+  SktReadFileName("file_name", d.file_name, std::string());
+  if (d.file_name.empty()) FatalError("Missing data file name: keyword file_name in section " + SktSectionPath());
+  if (rs.type == 1) {
+    SktReadKeyword("item_number_for_sxx", d.item_numbers[1], 1);
+    SktReadKeyword("item_number_for_sxy", d.item_numbers[2], 2);
+    SktReadKeyword("item_number_for_syy", d.item_numbers[3], 3);
+  } else {
+    SktReadKeyword("item_number_for_rx", d.item_numbers[1], 1);
+    SktReadKeyword("item_number_for_ry", d.item_numbers[2], 2);
+  }
+  SktCloseSection();
+  OpenElementData(hd, mesh, d);
+}
+
+void CloseForcingDataHD(HdModule& hd) {
+  HdForcing& f = hd.forcing;
+  for (DataSpec* d : {&f.depth.data, &f.ice.data, &f.radiation.data}) {
+    if (d->state.open) FemDataClose(*d);
+  }
 }
 
 }  // namespace vhd

@@ -34,6 +34,7 @@
 #include "core/array1.hpp"
 #include "core/run.hpp"
 #include "hydro/bound.hpp"
+#include "hydro/element_field.hpp"
 #include "hydro/forcing.hpp"
 #include "hydro/forcing_precipitation.hpp"
 #include "hydro/sources.hpp"
@@ -145,29 +146,6 @@ struct HdFloodDry {
   double elevation_margin = 100.0;  // limit = highest initial surface or bed + this margin (m)
   // Volume added in each element by the last check (m3).
   Array1<double> mass_cut;
-};
-
-// One input definition of a per-element coefficient: a constant (format 0),
-// values from a mesh data file read once (format 2), or a mesh data file that
-// varies in time (format 3).
-struct ElementField {
-  int format = 0;
-  double constant_value = 0.0;
-  std::string file_name;
-  int item_number = 1;
-  Array1<double> values;  // per element, current values
-
-  // Format 3: the open file and the two file steps that bracket the current
-  // time (times in seconds since the simulation start).
-  ZrnFile file;
-  int nsteps = 0;
-  int step_b = -1;  // later of the two steps in memory (-1: none read yet)
-  double time_a = 0.0, time_b = 0.0;
-  double file_offset = 0.0;  // simulation start minus the file's first step (s)
-  Array1<double> values_a, values_b;
-  // Format 3 on a renumbered mesh: the element order and the file's values.
-  Array1<int> file_index;
-  Array1<double> file_values;
 };
 
 // Stored bed-resistance codes (the setup's type minus one).

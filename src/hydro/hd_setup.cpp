@@ -53,10 +53,7 @@ struct UnavailableFeature {
 };
 
 constexpr UnavailableFeature kUnavailableFeatures[] = {
-    {"DEPTH", "A time-varying depth correction", {{"type", 0}}},
     {"INFILTRATION", "Infiltration", {{"type", 0}}},
-    {"RADIATION_STRESS", "Radiation stress", {{"type", 0}}},
-    {"ICE", "Ice cover", {{"type", 0}}},
     {"TEMPERATURE_SALINITY_MODULE", "Temperature and salinity", {{"temperature_mode", 0}, {"salinity_mode", 0}}},
 };
 
@@ -117,14 +114,17 @@ void SetupHD(HdModule& hd, const RunControl& run, const TimeAxis& time, const Mo
   const Mesh& mesh = *meshes[static_cast<std::size_t>(hd.number_of_2D_mesh_velocity - 1)];
   AllocateStateHD(hd, mesh);
   SetupFloodDryHD(hd);
+  SetupDepthHD(hd, mesh);
   SetupEddy(hd, mesh);
   SetupBedResistanceHD(hd, mesh);
   SetupCoriolisHD(hd);
   SetupWindHD(hd);
   RefuseUnavailableFeaturesHD();
-  SetupTideHD(hd);
   SetupPrecipitationHD(hd, mesh);
   SetupSourcesHD(hd, mesh);
+  SetupRadiationStressHD(hd, mesh);
+  SetupIceHD(hd, mesh);
+  SetupTideHD(hd);
   SetupSolutionMethodHD(hd);
   if (hd.mode == 2) SetupInitialConditionsHD(hd);
   SetupBoundCondHD(hd, mesh, hd.boundary);

@@ -1,5 +1,6 @@
 #include "hydro/reconstruction.hpp"
 
+#include "core/omp.hpp"
 #include "mesh/gradient.hpp"
 #include "mesh/gradient_limiter.hpp"
 
@@ -41,15 +42,27 @@ void SetupReconstructionHD(const HdModule& hd, const Mesh& mesh, HdSolver& s) {
 void UpdateReconstructionHD(HdModule& hd, HdSolver& s, const Mesh& mesh) {
   const HdState& st = hd.state;
   const int limiter = hd.solution.gradient_limiter;
+  // With a depth correction k the surface that drives the flow is eta + k;
+  // reconstructing its gradient keeps a lake at rest (eta + k uniform) at
+  // rest where k varies.
+  const Array1<double>* surface = &st.eta;
+  if (!s.depth_correction.empty()) {
+    const int n = st.nelements;
+    const double *eta = st.eta.data(), *k = s.depth_correction.data();
+    double* x = s.surface_k.data();
+    VHD_OMP_PARALLEL_FOR
+    for (int e = 1; e <= n; ++e) x[e] = eta[e] + k[e];
+    surface = &s.surface_k;
+  }
   if (limiter == kLimiterNone || limiter == kLimiterBarthJespersen) {
     // The three fields in one pass over the stencil and the limiter table.
     const GradientField fields[3] = {
-        {&st.eta, &s.eta_x, &s.eta_y}, {&st.P, &s.P_x, &s.P_y}, {&st.Q, &s.Q_x, &s.Q_y}};
+        {surface, &s.eta_x, &s.eta_y}, {&st.P, &s.P_x, &s.P_y}, {&st.Q, &s.Q_x, &s.Q_y}};
     CALCGRADIENTALLELEMENT2D(s.gradient, fields);
     if (limiter == kLimiterBarthJespersen)
       CALCLIMITEDGRADIENTALLBJ2D(s.limiter_geometry, st.wetdry, fields, s.limiter_epsilon);
   } else {
-    LimitedGradient(hd, s, mesh, st.eta, s.eta_x, s.eta_y);
+    LimitedGradient(hd, s, mesh, *surface, s.eta_x, s.eta_y);
     LimitedGradient(hd, s, mesh, st.P, s.P_x, s.P_y);
     LimitedGradient(hd, s, mesh, st.Q, s.Q_x, s.Q_y);
   }

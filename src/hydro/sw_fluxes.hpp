@@ -161,6 +161,9 @@ struct HdSolver {
   // Element depth correction k (m): allocated and filled by a depth
   // correction when one is active; empty in ordinary runs, where k is 0.
   Array1<double> depth_correction;
+  // eta + k per element, whose gradient the second-order reconstruction
+  // takes for the surface while a depth correction is active.
+  Array1<double> surface_k;
   // Weight of the velocity filter (element area, m2), and scratch for it
   // (allocated when the filter is on).
   Array1<double> filter_weight, filter_u, filter_v;

@@ -50,9 +50,9 @@ double ExchangeValue(const AdExchange& x, int e, double c) {
 }
 
 // Dispersion coefficient of a face between elements of coefficients a, b:
-// min(a + b, 4 a, 4 b) / 4 (so that a = b = D gives D, and the face value is
+// min(a + b, 4 a, 4 b) / 2 (so that a = b = D gives D, and the face value is
 // at most twice the smaller one).
-inline double FaceDispersion(double a, double b) { return 0.25 * std::min(a + b, 4.0 * std::min(a, b)); }
+inline double FaceDispersion(double a, double b) { return 0.5 * std::min(a + b, 4.0 * std::min(a, b)); }
 
 // Longitude difference taken the short way round (radians).
 inline double WrapLongitude(double dx) { return std::remainder(dx, 2.0 * std::numbers::pi); }
@@ -248,9 +248,19 @@ void AdSolver::Setup(const HdModule& hd, const HdSolver& hd_solver, const Mesh& 
     face_oy2_[f] = F.yf[f] - E.yc[b];
   }
 
+  // Per element: the sum over its faces to neighbours of L / (d.n), the
+  // dispersive conductance per unit coefficient and depth.
+  element_conductance_.assign(st.nelements, 0.0);
+  for (int f = 1; f <= nf; ++f) {
+    const int a = F.element1[f], b = F.element2[f];
+    if (a <= 0 || b <= 0) continue;
+    element_conductance_[a] += face_len_[f] * face_idn_[f];
+    element_conductance_[b] += face_len_[f] * face_idn_[f];
+  }
+
   SetupGradient(mesh, technique.gradient_calculation, Array1<int>(), Array1<int>(), 2,
                 technique.boundary_correction, 0, stencil_);
-  if (technique.gradient_limiter == kLimiterBarthJespersen) SetupLimiterGeometry2D(mesh, limiter_geometry_);
+  if (technique.gradient_limiter != kLimiterNone) SetupLimiterGeometry2D(mesh, limiter_geometry_);
 
   const int ne = st.nelements;
   for (Array1<double>* a : {&m_base_, &m_, &gx_, &gy_, &gx_raw_, &gy_raw_}) a->assign(ne, 0.0);
@@ -266,38 +276,36 @@ void AdSolver::Setup(const HdModule& hd, const HdSolver& hd_solver, const Mesh& 
 
 int AdSolver::SubStepCount(const AdFlow& flow, const AdComponent& comp) {
   // Rate r (1/s) of an element wet over the whole sub-step and deeper than
-  // h_min: the water leaving it and the dispersive conductance of its faces
-  // to wet neighbours over the volume it holds (the smaller of its start and
-  // end depths). The transport sub-step is CFL_critical_AD / max r, within
-  // dt_min_AD and dt_max_AD; the HD sub-step is split into n equal ones.
+  // h_min: the water leaving it and its dispersive conductance (its own
+  // coefficient over the faces to neighbours at its larger depth: exact for
+  // a uniform coefficient and depth) over the volume it holds (the smaller
+  // of its start and end depths). The transport sub-step is
+  // CFL_critical_AD / max r, within dt_min_AD and dt_max_AD; the HD
+  // sub-step is split into n equal ones.
   const HdSolver& hs = *hd_solver_;
-  const FaceTable& F = mesh_->faces;
   const double dt = flow.dt;
   const double* vol = flow.face_volume.data();
   const double* D = comp.dispersion.empty() ? nullptr : comp.dispersion.data();
+  const double* h0 = flow.h_start.data();
+  const double* h1 = flow.h_end.data();
+  const int* code0 = flow.wetdry.data();
+  const int* code1 = flow.wetdry_end.data();
+  const double* conductance = element_conductance_.data();
   const double h_min = technique_.h_min;
   const int* slots = hs.slot_face_side.data();
   const int planes = hs.face_planes, stride = hs.plane_stride;
   double rmax = 0.0;
   VHD_OMP_PARALLEL_FOR_REDUCTION(max, rmax)
   for (int e = 1; e <= nowned_; ++e) {
-    cfl_[e] = 0.0;
-    const double h = std::min(flow.h_start[e], flow.h_end[e]);
-    if (flow.wetdry[e] != kWet || flow.wetdry_end[e] != kWet || !(h > h_min)) continue;
-    double out = 0.0, conductance = 0.0;
+    const double h = std::min(h0[e], h1[e]);
+    double out = 0.0;
     for (int j = 0; j < planes; ++j) {
       const int m = slots[j * stride + e];
-      const int f = m >> 1;
-      if (f == 0) continue;
-      const double leaving = (m & 1) ? -vol[f] : vol[f];
-      out += std::max(0.0, leaving);
-      const int nb = (m & 1) ? F.element1[f] : F.element2[f];
-      if (D && nb > 0 && flow.wetdry[nb] == kWet) {
-        const double hf = 0.5 * (std::max(flow.h_start[e], flow.h_end[e]) + std::max(flow.h_start[nb], flow.h_end[nb]));
-        conductance += FaceDispersion(D[e], D[nb]) * hf * face_len_[f] * face_idn_[f];
-      }
+      out += std::max(0.0, (m & 1) ? -vol[m >> 1] : vol[m >> 1]);
     }
-    const double rate = (out / dt + conductance) / (area_[e] * h);
+    const double dispersive = D ? D[e] * conductance[e] * std::max(h0[e], h1[e]) : 0.0;
+    const bool counted = code0[e] == kWet && code1[e] == kWet && h > h_min;
+    const double rate = counted ? (out / dt + dispersive) / (area_[e] * h) : 0.0;
     cfl_[e] = rate;
     rmax = std::max(rmax, rate);
   }
@@ -313,14 +321,19 @@ int AdSolver::SubStepCount(const AdFlow& flow, const AdComponent& comp) {
   return n;
 }
 
-void AdSolver::SurfaceAndSources(const AdFlow& flow, AdComponent& comp, double n_inv) {
-  // Precipitation, evaporation and the water of cut depths (carrying the
-  // element's concentration) per element, then the point sources, with the
-  // concentrations at the start of the sub-step. The water itself goes into
-  // source_water_ by the same operations with the concentration 1.
+void AdSolver::SurfaceAndSources(const AdFlow& flow, AdComponent& comp, double n_inv, double t0) {
+  // The mass and depth at the start of the sub-step (time fraction t0 of the
+  // HD sub-step); precipitation, evaporation and the water of cut depths
+  // (carrying the element's concentration) per element, then the point
+  // sources, with the concentrations at the start of the sub-step. The water
+  // itself goes into source_water_ by the same operations with the
+  // concentration 1.
   const double* c = comp.c.data();
   VHD_OMP_PARALLEL_FOR
   for (int e = 1; e <= nowned_; ++e) {
+    const double h = flow.h_start[e] + t0 * (flow.h_end[e] - flow.h_start[e]);
+    m_base_[e] = m_[e] = c[e] * h;
+    h_base_[e] = h_[e] = h;
     const double surface = n_inv * (flow.precipitation[e] * ExchangeValue(comp.precipitation, e, c[e]) -
                                     flow.evaporation[e] * ExchangeValue(comp.evaporation, e, c[e]));
     const double cut = n_inv * flow.cut[e] * c[e];
@@ -363,27 +376,12 @@ void AdSolver::SurfaceAndSources(const AdFlow& flow, AdComponent& comp, double n
   }
 }
 
-void AdSolver::WaterRates(const AdFlow& flow, double n_inv) {
-  // The depth change per area over the sub-step of every owned element:
-  // the face volumes and the water of the sources, summed exactly as the
-  // element update sums the masses.
-  const HdSolver& hs = *hd_solver_;
-  const int* slots = hs.slot_face_side.data();
-  const int planes = hs.face_planes, stride = hs.plane_stride;
-  const double* vol = flow.face_volume.data();
-  VHD_OMP_PARALLEL_FOR
-  for (int e = 1; e <= nowned_; ++e) {
-    double in = 0.0;
-    for (int j = 0; j < planes; ++j) {
-      const int m = slots[j * stride + e];
-      const double v = n_inv * vol[m >> 1];
-      in += (m & 1) ? v : -v;
-    }
-    water_rate_[e] = (in + source_water_[e]) / area_[e];
-  }
-}
-
-void AdSolver::Gradients(const AdComponent& comp, const Array1<int>& wetdry) {
+void AdSolver::Gradients(const AdFlow& flow, const AdComponent& comp) {
+  // Limited gradients of c, with the wet/dry codes as the limiter's activity
+  // flags. The limiter does not see the values at open boundary faces, so an
+  // element that takes water in through one keeps the first order (its
+  // reconstruction could otherwise reach past the water entering it).
+  const Array1<int>& wetdry = flow.wetdry;
   const int limiter = technique_.gradient_limiter;
   if (limiter == kLimiterENO || limiter == kLimiterWeighted) {
     CALCGRADIENTELEMENT2D(stencil_, comp.c, gx_raw_, gy_raw_);
@@ -395,7 +393,54 @@ void AdSolver::Gradients(const AdComponent& comp, const Array1<int>& wetdry) {
     if (limiter == kLimiterBarthJespersen)
       CALCLIMITEDGRADIENTBJ2D(limiter_geometry_, comp.c, wetdry, gx_, gy_, gx_, gy_, kLimiterEpsilon);
   }
+  if (limiter != kLimiterNone) LimitAtClosedFaces(comp, wetdry);
+  const Array1<BoundaryFaceCondition>& bf = hd_->boundary.faces;
+  for (int i = 1; i <= bf.size(); ++i) {
+    const int e = bf[i].element;
+    if (e <= nowned_ && flow.face_volume[bf[i].face] < 0) gx_[e] = gy_[e] = 0.0;
+  }
   if (subdomain_ && subdomain_->Active()) ExchangeHalo(*subdomain_, {&gx_, &gy_});
+}
+
+void AdSolver::LimitAtClosedFaces(const AdComponent& comp, const Array1<int>& wetdry) {
+  // The mesh limiters bound the reconstruction at faces to wet neighbours
+  // only. A wet element with a boundary face or a face to an element that is
+  // not wet is scaled (Barth-Jespersen) so that the value reconstructed at
+  // those faces too stays within the range of the element and its wet
+  // neighbours: otherwise a gradient along the wall could lift every face
+  // value to an open neighbour above a local minimum, and the minimum would
+  // fall.
+  const LimiterGeometry2D& g = limiter_geometry_;
+  const int nf = g.faces;
+  const double* c = comp.c.data();
+  const int* code = wetdry.data();
+  VHD_OMP_PARALLEL_FOR
+  for (int e = 1; e <= nowned_; ++e) {
+    if (code[e] != kWet) continue;
+    double lo = c[e], hi = c[e];
+    bool closed = false;
+    for (int j = 0; j < nf; ++j) {
+      const int nb = g.neighbour[static_cast<std::size_t>(e) * nf + j];
+      if (nb > 0 && code[nb] == kWet) {
+        lo = std::min(lo, c[nb]);
+        hi = std::max(hi, c[nb]);
+      } else {
+        closed = true;
+      }
+    }
+    if (!closed) continue;
+    double alpha = 1.0;
+    for (int j = 0; j < nf; ++j) {
+      const std::size_t k = static_cast<std::size_t>(e) * nf + j;
+      const int nb = g.neighbour[k];
+      if (nb > 0 && code[nb] == kWet) continue;
+      const double D = gx_[e] * g.dx[k] + gy_[e] * g.dy[k];
+      if (D > kLimiterEpsilon) alpha = std::min(alpha, (hi - c[e]) / D);
+      if (D < -kLimiterEpsilon) alpha = std::min(alpha, (lo - c[e]) / D);
+    }
+    gx_[e] *= alpha;
+    gy_[e] *= alpha;
+  }
 }
 
 void AdSolver::FaceFluxes(const AdFlow& flow, const AdComponent& comp, double frac, double n_inv, double weight) {
@@ -474,7 +519,7 @@ void AdSolver::FaceFluxes(const AdFlow& flow, const AdComponent& comp, double fr
 }
 
 void AdSolver::UpdateElements(const AdFlow& flow, AdComponent& comp, double alpha, double w, double frac,
-                              double n_inv, double weight, bool sub_end) {
+                              double n_inv, double weight, bool first, bool sub_end) {
   // The stage advances the mass and, by the same operations, the water
   // depth carried by the face volumes (so that a uniform concentration has
   // exactly its mass); c = m / h of that depth. frac: time of the stage's
@@ -486,21 +531,32 @@ void AdSolver::UpdateElements(const AdFlow& flow, AdComponent& comp, double alph
   const int* slots = hs.slot_face_side.data();
   const int planes = hs.face_planes, stride = hs.plane_stride;
   const double* flux = face_flux_.data();
+  const double* vol = flow.face_volume.data();
   const double* h0 = flow.h_start.data();
   const double* h1 = flow.h_end.data();
   const double dt_sub = flow.dt * n_inv;
   const double k_const = comp.decay_constant;
   const double* k_field = comp.decay.empty() ? nullptr : comp.decay.data();
   const double lo = comp.minimum, hi = comp.maximum, h_min = technique_.h_min;
+  // A stage of weight 0 (the first of the midpoint scheme) does not enter
+  // the budgets.
+  const bool book = weight != 0.0, book_decay = book && (k_field || k_const != 0.0);
   double* c = comp.c.data();
   VHD_OMP_PARALLEL_FOR
   for (int e = 1; e <= nowned_; ++e) {
-    double in = 0.0;
+    double in = 0.0, water = 0.0;
     for (int j = 0; j < planes; ++j) {
       const int m = slots[j * stride + e];
       in += (m & 1) ? flux[m >> 1] : -flux[m >> 1];
+      if (first) {
+        const double v = n_inv * vol[m >> 1];
+        water += (m & 1) ? v : -v;
+      }
     }
     const double A = area_[e];
+    // The depth change of the sub-step per area, summed as the mass is (the
+    // same for every stage).
+    if (first) water_rate_[e] = (water + source_water_[e]) / A;
     const double R = (in + source_mass_[e]) / A;
     const double k = k_field ? k_field[e] : k_const;
     const double pre = alpha * m_base_[e] + (1.0 - alpha) * m_[e] + w * R;
@@ -508,8 +564,8 @@ void AdSolver::UpdateElements(const AdFlow& flow, AdComponent& comp, double alph
     const double h = alpha * h_base_[e] + (1.0 - alpha) * h_[e] + w * water_rate_[e];
     // The clamp acts where the element has a concentration (h > h_min).
     const double mc = h > h_min ? std::min(std::max(m, lo * h), hi * h) : m;
-    decay_step_[e] += weight * (pre - m) * A;
-    clamp_step_[e] += weight * (mc - m) * A;
+    if (book_decay) decay_step_[e] += weight * (pre - m) * A;
+    if (book) clamp_step_[e] += weight * (mc - m) * A;
     m_[e] = mc;
     h_[e] = h;
     if (h > h_min) c[e] = mc / h;
@@ -534,28 +590,20 @@ int AdSolver::Step(const AdFlow& flow, AdComponent& comp) {
 
   for (int k = 0; k < n; ++k) {
     const double t0 = k * n_inv;  // start of the sub-step, fraction of the HD sub-step
-    SurfaceAndSources(flow, comp, n_inv);
-    WaterRates(flow, n_inv);
-    VHD_OMP_PARALLEL_FOR
-    for (int e = 1; e <= nowned_; ++e) {
-      const double h = flow.h_start[e] + t0 * (flow.h_end[e] - flow.h_start[e]);
-      m_base_[e] = comp.c[e] * h;
-      m_[e] = m_base_[e];
-      h_base_[e] = h;
-      h_[e] = h;
-    }
+    SurfaceAndSources(flow, comp, n_inv, t0);
     double frac_in = 0.0;
     for (int s = 0; s < nstages; ++s) {
       const StageRule& r = rules[s];
       const double frac_out = k + 1 == n && r.frac == 1.0 ? 1.0 : (k + r.frac) * n_inv;
-      if (gradients) Gradients(comp, flow.wetdry);
+      if (gradients) Gradients(flow, comp);
       FaceFluxes(flow, comp, (k + frac_in) * n_inv, n_inv, r.weight * r.w);
-      UpdateElements(flow, comp, r.alpha, r.w, frac_out, n_inv, r.weight, s + 1 == nstages);
+      UpdateElements(flow, comp, r.alpha, r.w, frac_out, n_inv, r.weight, s == 0, s + 1 == nstages);
       if (exchange) ExchangeHalo(*subdomain_, {&comp.c});
       frac_in = r.frac;
     }
   }
 
+  VHD_OMP_PARALLEL_FOR
   for (int e = 1; e <= nowned_; ++e) {
     comp.clamp_correction[e] = clamp_step_[e];
     comp.clamp_total[e] += clamp_step_[e];

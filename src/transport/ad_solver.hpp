@@ -24,14 +24,15 @@
 // concentration with sources and boundaries of the same concentration stays
 // uniform. The stages advance the water depth with the same volumes and the
 // same operations as the mass (m for c = 1), and c = m / h of that depth, so
-// c = 1 stays 1 to the last bit; at the end of a sub-step the mass is c times
-// the HD depth again (what that moves, round-off and the elements that kept
-// their concentration, is the drying correction). When the transport's own stability condition
-// (CFL_critical_AD, dt_min_AD, dt_max_AD: advection out of the element and
-// explicit dispersion) asks for a shorter step, the HD sub-step is split into
-// n equal transport sub-steps that take 1/n of every volume and the depths
-// interpolated linearly between start and end; n is the largest over the
-// processes.
+// c = 1 stays 1 to the last bit; at the end of a sub-step the mass is c
+// times the HD depth again (what that moves, round-off and the elements that
+// kept their concentration, is the drying correction). When the transport's
+// own stability rule (CFL_critical_AD, dt_min_AD, dt_max_AD; the rate of an
+// element is the water leaving it plus its dispersive conductance, its own
+// coefficient over its faces to neighbours, over the water it holds) asks
+// for a shorter step, the HD sub-step is split into n equal transport
+// sub-steps that take 1/n of every volume and the depths interpolated
+// linearly between start and end; n is the largest over the processes.
 //
 // Time integration (AdSolutionTechnique::scheme_of_time_integration), each
 // stage m = (base + w dt R) / (1 + w dt k):
@@ -45,11 +46,14 @@
 //
 // Space: first order takes the upwind element's concentration at the face;
 // second order reconstructs it to the face centre with the upwind element's
-// limited gradient (the mesh gradient stencils and limiters). A face with a
+// limited gradient (the mesh gradient stencils and limiters; an element with
+// a boundary face or a face to an element that is not wet is limited at
+// those faces too, and one that takes water in through an open boundary
+// stays first order, so that no new extremum forms). A face with a
 // side that is not wet carries only advection, first order, with the
 // concentration of the upwind element (which held the water). Dispersion at
 // a face between two wet elements: F_d = -L D_f h_f dc/dn with
-// D_f = min(D_L + D_R, 4 D_L, 4 D_R) / 4 (so D for D_L = D_R = D, at most
+// D_f = min(D_L + D_R, 4 D_L, 4 D_R) / 2 (so D for D_L = D_R = D, at most
 // twice the smaller), h_f the mean depth of the two sides and dc/dn the
 // two-point difference over the normal distance of the centres plus the
 // tangential correction from the mean of the two element gradients.
@@ -223,12 +227,12 @@ class AdSolver {
 
  private:
   int SubStepCount(const AdFlow& flow, const AdComponent& comp);
-  void SurfaceAndSources(const AdFlow& flow, AdComponent& comp, double n_inv);
-  void WaterRates(const AdFlow& flow, double n_inv);
-  void Gradients(const AdComponent& comp, const Array1<int>& wetdry);
+  void SurfaceAndSources(const AdFlow& flow, AdComponent& comp, double n_inv, double t0);
+  void Gradients(const AdFlow& flow, const AdComponent& comp);
+  void LimitAtClosedFaces(const AdComponent& comp, const Array1<int>& wetdry);
   void FaceFluxes(const AdFlow& flow, const AdComponent& comp, double frac, double n_inv, double weight);
   void UpdateElements(const AdFlow& flow, AdComponent& comp, double alpha, double w, double frac, double n_inv,
-                      double weight, bool sub_end);
+                      double weight, bool first, bool sub_end);
 
   const HdModule* hd_ = nullptr;
   const HdSolver* hd_solver_ = nullptr;  // its interior faces and element face slots
@@ -247,6 +251,8 @@ class AdSolver {
   // face centre minus each centroid (mesh units).
   Array1<double> face_idn_, face_tx_, face_ty_;
   Array1<double> face_ox1_, face_oy1_, face_ox2_, face_oy2_;
+
+  Array1<double> element_conductance_;  // per element: sum of L / (d.n) over its faces to neighbours (1)
 
   GradientStencil stencil_;
   LimiterGeometry2D limiter_geometry_;

@@ -99,11 +99,11 @@ status_is 0 $? "misspelt section"
 contains_joined "$d/setup.log" "Warning: Section BED_RESISTENCE in section VantorHD/HYDRODYNAMIC_MODULE, line 16: not used; did you mean BED_RESISTANCE?"
 
 # A feature this build does not have stops the run when it is switched on.
-d=$(case_dir ice)
+d=$(case_dir infiltration)
 write_setup "$d/setup.toml" 1
-printf '[VantorHD.HYDRODYNAMIC_MODULE.ICE]\ntype = 1\n' >> "$d/setup.toml"
+printf '[VantorHD.HYDRODYNAMIC_MODULE.INFILTRATION]\ntype = 1\n' >> "$d/setup.toml"
 "$VANTORHD" "$d/setup.toml" > "$d/out" 2>&1
-status_is 1 $? "ice cover"
-contains_joined "$d/setup.log" "Ice cover is not available in this build"
+status_is 1 $? "infiltration"
+contains_joined "$d/setup.log" "Infiltration is not available in this build"
 
 finish

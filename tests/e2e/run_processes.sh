@@ -4,7 +4,8 @@
 # sub-domains. Two cases: the bundled tidal example (flooding and drying of a
 # flat) and a flood from a discharge boundary onto a dry slope of triangles
 # and quadrilaterals, second order, which must also take in the prescribed
-# volume in full. Skipped without mpirun.
+# volume in full; then the slope under wind, pressure and Coriolis, and
+# under ice over a time-varying depth correction. Skipped without mpirun.
 . ./driver_common.inc
 export TANO_PROGRESS=NONE
 # Idle processes yield the core, so that 4 processes on 2 busy cores do not
@@ -142,5 +143,38 @@ run_case "$s" 1 1
 run_case "$s" 2 1
 same_results "${s}_n1_t1" "${s}_n2_t1"
 contains "${s}_n1_t1/setup.log" "Section: WIND_FORCING"
+
+# The storm under ice over a moving bed: the depth correction, the ice
+# thickness and the ice concentration (sheltering the wind in part, between
+# 0 and 2) all from the map's total depth, with an ice roughness.
+i=$(case_dir storm_ice)
+cp "$s/slope.mesh" "$s/map.zrnu" "$i/"
+sed -n '1,/^\[VantorHD.HYDRODYNAMIC_MODULE.BOUNDARY_CONDITIONS.CODE_1\]/p' "$s/setup.toml" | sed '$d' > "$i/setup.toml"
+cat >> "$i/setup.toml" <<'SETUP'
+[VantorHD.HYDRODYNAMIC_MODULE.DEPTH]
+type = 1
+format = 3
+file_name = "map.zrnu"
+item_number = 2
+
+[VantorHD.HYDRODYNAMIC_MODULE.ICE]
+type = 3
+c_cut_off_lower = 0.0
+c_cut_off = 2.0
+format = 3
+file_name = "map.zrnu"
+item_number_concentration = 2
+item_number_thickness = 2
+
+[VantorHD.HYDRODYNAMIC_MODULE.ICE.ROUGHNESS]
+constant_value = 0.05
+
+SETUP
+sed -n '/^\[VantorHD.HYDRODYNAMIC_MODULE.BOUNDARY_CONDITIONS.CODE_1\]/,$p' "$s/setup.toml" >> "$i/setup.toml"
+run_case "$i" 1 1
+run_case "$i" 2 1
+same_results "${i}_n1_t1" "${i}_n2_t1"
+contains "${i}_n1_t1/setup.log" "Section: ICE"
+contains "${i}_n1_t1/setup.log" "Section: DEPTH"
 
 finish

@@ -86,6 +86,42 @@ TEST(ForcingSetup, WindSeriesInterpolatesTheDirectionThroughNorth) {
   EXPECT_NEAR(f.hd.forcing.wind.v, -15.0, 1e-12);
 }
 
+// A series step without a speed (the file's delete value, here -999) gives
+// calm air while it brackets the time, not a wind of -999 m/s; the wind
+// returns with the next complete pair of steps.
+TEST(ForcingSetup, WindSeriesWithoutAValueIsCalm) {
+  HdSetupFixture f;
+  ZrnFile z;
+  ASSERT_EQ(zrnHeaderCreate(z, f.dir.file("wind.zrn0"), kZrnFileData, "wind"), 0);
+  ASSERT_EQ(zrnSetEqCalendarAxis(z, zrnDateTime(f.time.start), 3600.0), 0);
+  ASSERT_EQ(zrnSetDeleteValFloat(z, -999.0), 0);
+  for (int k = 1; k <= 2; ++k) {
+    ASSERT_EQ(zrnSetItemInfo(z, k, k == 1 ? "Speed" : "Direction", kUvqItemUndefined, kUvqUnitUndefined, kZrnDouble),
+              0);
+    ASSERT_EQ(zrnSetItemAxisEqD0(z, k), 0);
+  }
+  ASSERT_EQ(zrnFileCreate(z), 0);
+  const double values[4][2] = {{10.0, 0.0}, {-999.0, 0.0}, {20.0, -999.0}, {12.0, 90.0}};
+  for (const auto& step : values) {
+    for (double v : step) ASSERT_EQ(zrnWriteItemTimeStep(z, 0.0, &v, 1), 0);
+  }
+  ASSERT_EQ(zrnFileClose(z), 0);
+  HdSolver s;
+  f.time.last_step = 360;
+  SetupWithSolver(f, kHd + HdSection("WIND_FORCING", "type = 1\nformat = 1\nfile_name = \"wind.zrn0\"\n"),
+                  MakeMesh(3, 3, 10.0, 10.0, test::Flat(2.0)), s);
+  struct Case {
+    double t, u, v;
+  } cases[] = {{0.0, 0.0, -10.0}, {1800.0, 0.0, 0.0}, {5400.0, 0.0, 0.0}, {9000.0, 0.0, 0.0}, {10800.0, -12.0, 0.0}};
+  for (const Case& c : cases) {
+    UpdateForcingHD(f.hd, s, f.meshes[0], c.t, 30.0);
+    EXPECT_NEAR(f.hd.forcing.wind.u, c.u, 1e-12) << c.t;
+    EXPECT_NEAR(f.hd.forcing.wind.v, c.v, 1e-12) << c.t;
+    EXPECT_EQ(f.hd.boundary.forcing.wind_x[5] == 0.0 && f.hd.boundary.forcing.wind_y[5] == 0.0, c.u == 0 && c.v == 0)
+        << c.t;
+  }
+}
+
 TEST(ForcingSetup, SoftStartGrowsTheWindAndMovesThePressure) {
   HdModule hd;
   HdWindForcing& w = hd.forcing.wind;
@@ -261,6 +297,58 @@ TEST(ForcingTide, ConstituentsOfTheSetupFile) {
   EXPECT_NEAR(hd.forcing.tide.eta_eq[2], A * std::cos(lat) * std::cos(lat) * std::cos(2 * lon + chi), 1e-12);
 }
 
+// DEPTH, ICE with ROUGHNESS and their fields from the setup file: the
+// constant depth correction on every element, the wind factor between the
+// cut-offs, the ice cover from the thickness and the surface drag
+// coefficient of the roughness height; the lower cut-off defaults to the
+// upper one.
+TEST(ForcingSetup, DepthAndIceFromTheSetupFile) {
+  HdSetupFixture f;
+  HdSolver s;
+  SetupWithSolver(f,
+                  kHd + HdSection("DEPTH", "type = 1\nconstant_value = 0.25\n") +
+                      HdSection("ICE", "type = 3\nc_cut_off_lower = 0.5\nc_cut_off = 0.9\nconstant_values = [0.7, 0.4]\n") +
+                      HdSection("ICE.ROUGHNESS", "constant_value = 0.02\n"),
+                  MakeMesh(3, 3, 10.0, 10.0, test::Flat(2.0)), s);
+  HdModule& hd = f.hd;
+  UpdateForcingHD(hd, s, f.meshes[0], 0.0, 30.0);
+  for (int e = 1; e <= 9; ++e) {
+    EXPECT_EQ(s.depth_correction[e], 0.25);
+    EXPECT_NEAR(hd.forcing.ice.wind_factor[e], std::sqrt(0.5), 1e-15);
+    EXPECT_EQ(hd.forcing.ice.cover[e], 1.0);
+    // Manning number of the roughness height: M = 25.4 / k_s^(1/6).
+    const double M = 25.4 / std::pow(0.02, 1.0 / 6.0);
+    EXPECT_NEAR(hd.bed.K_surface[e], 9.81 / (M * M), 1e-15);
+  }
+  EXPECT_EQ(hd.ice_type, 3);
+
+  HdSetupFixture g;
+  HdSolver t;
+  SetupWithSolver(g, kHd + HdSection("ICE", "type = 1\nc_cut_off = 0.8\nconstant_value = 0.85\n"),
+                  MakeMesh(3, 3, 10.0, 10.0, test::Flat(2.0)), t);
+  EXPECT_EQ(g.hd.forcing.ice.c_cut_off_lower, 0.8);
+  UpdateForcingHD(g.hd, t, g.meshes[0], 0.0, 30.0);
+  // Above the cut-off without thickness data: covered, no wind; no
+  // roughness given: no surface drag.
+  EXPECT_EQ(g.hd.forcing.ice.wind_factor[4], 0.0);
+  EXPECT_EQ(g.hd.forcing.ice.cover[4], 1.0);
+  EXPECT_EQ(g.hd.bed.K_surface[4], 0.0);
+}
+
+// A depth correction on separate geometry, velocity and elevation meshes
+// is refused.
+TEST(ForcingSetupDeath, DepthCorrectionOnSeparateMeshes) {
+  HdSetupFixture f;
+  const Mesh mesh = MakeMesh(3, 3, 10.0, 10.0, test::Flat(2.0));
+  test::ExpectStop(
+      [&] {
+        f.Open(kHd + HdSection("SPACE", "number_of_2D_mesh_geometry = 2\n") + HdSection("DEPTH", "type = 1\n"));
+        f.meshes = {mesh, mesh};
+        SetupHD(f.hd, f.run, f.time, f.modules, f.meshes);
+      },
+      f.log_path, "SetupDepth do not support discretization=1");
+}
+
 // Every setup message of the forcings that a user can provoke.
 TEST(ForcingSetupDeath, MessagesOfTheSetup) {
   const Mesh local = MakeMesh(3, 3, 10.0, 10.0, test::Flat(2.0));
@@ -292,6 +380,25 @@ TEST(ForcingSetupDeath, MessagesOfTheSetup) {
       {HdSection("TIDAL_POTENTIAL", "type = 1\nnumber_of_constituents = 1\n") +
            HdSection("TIDAL_POTENTIAL.CONSTITUENT_1", "species = 2\n"),
        true, "SetupTide: period = 0 s"},
+      {HdSection("DEPTH", "type = -1\n"), true, "Type not supported (type = -1"},
+      {HdSection("DEPTH", "type = 1\nformat = 4\n"), true, "Format not supported (format = 4"},
+      {HdSection("DEPTH", "type = 1\nformat = 3\n"), true, "Missing data file name: keyword file_name"},
+      {HdSection("ICE", "type = 4\n"), true, "Type not supported for ice conditions."},
+      {HdSection("ICE", "type = 1\nformat = 5\n"), true, "Format not supported for ice conditions."},
+      {HdSection("ICE", "type = 1\nc_cut_off_lower = 0.95\n"), true, "Illegal lower cut off value"},
+      {HdSection("ICE", "type = 2\nthickness_cut_off = -1\n"), true,
+       "SetupIceHD: the thickness cut-off must not be negative"},
+      {HdSection("ICE", "type = 2\n") + HdSection("ICE.ROUGHNESS", "format = 1\n"), true,
+       "Format not supported for roughness."},
+      {HdSection("ICE", "type = 2\n") + HdSection("ICE.ROUGHNESS", "type = 1\n"), true,
+       "SetupIceHD: the ice roughness type is not supported"},
+      {HdSection("ICE", "type = 2\n") + HdSection("ICE.ROUGHNESS", "constant_value = -0.1\n"), true,
+       "SetupIceHD: the ice roughness of element"},
+      {HdSection("RADIATION_STRESS", "type = 6\n"), true, "Type not supported for radiation stress variation."},
+      {HdSection("RADIATION_STRESS", "type = 1\n"), true, "Format not supported for radiation stress."},
+      {HdSection("RADIATION_STRESS", "type = 3\nformat = 3\n"), true, "Missing data file name: keyword file_name"},
+      {HdSection("RADIATION_STRESS", "type = 1\nformat = 3\nsoft_time_interval = -5\n"), true,
+       "SetupRadiationStressHD: the soft time interval must not be negative"},
   };
   for (const Case& c : cases) {
     SCOPED_TRACE(c.message);

@@ -212,9 +212,7 @@ TEST(SetupHDDeath, FeaturesNotInTheBuildStopTheRunWhenSwitchedOn) {
     std::string section, keys, message;
   } cases[] = {
       {"PRECIPITATION_EVAPORATION", "type_of_evaporation = 2\n", "heat exchange" + na + "type_of_evaporation = 2"},
-      {"ICE", "type = 2\n", "Ice cover" + na + "type = 2"},
-      {"DEPTH", "type = 1\n", "depth correction" + na + "type = 1"},
-      {"RADIATION_STRESS", "type = 1\n", "Radiation stress" + na},
+      {"RADIATION_STRESS", "type = 2\n", "Radiation stress from the wave module" + na + "type = 2"},
       {"INFILTRATION", "type = 1\n", "Infiltration" + na},
       {"TEMPERATURE_SALINITY_MODULE", "salinity_mode = 2\n", "Temperature and salinity" + na + "salinity_mode = 2"},
   };

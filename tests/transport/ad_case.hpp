@@ -136,6 +136,17 @@ struct PrescribedCase {
     c.hd.time_step.dt_max_AD = dt;
     StartCase(c, [](double, double) { return 0.0; });
     for (int e = 1; e <= c.hd.state.nelements; ++e) c.hd.state.h[e] = depth;
+    // Every boundary face open: water leaves with the element's
+    // concentration and enters with the boundary value (0).
+    const FaceTable& F = c.mesh.faces;
+    int nb = 0;
+    for (int f = 1; f <= F.nfaces; ++f) nb += F.element2[f] == 0 ? 1 : 0;
+    c.hd.boundary.faces.assign(nb);
+    for (int f = 1, i = 0; f <= F.nfaces; ++f) {
+      if (F.element2[f] != 0) continue;
+      BoundaryFaceCondition& fc = c.hd.boundary.faces[++i];
+      fc.face = f, fc.element = F.element1[f], fc.code = F.code[f], fc.type = kBcLevel;
+    }
     ad.Setup(c.hd, c.solver, c.mesh, technique);
     AllocateFlowAD(c.hd, flow);
     AllocateComponentAD(c.hd, comp);
@@ -147,6 +158,7 @@ struct PrescribedCase {
     }
     for (int f = 1; f <= c.mesh.faces.nfaces; ++f)
       flow.face_volume[f] = psi ? StreamVolume(c.mesh, f, depth, dt, psi) : 0.0;
+    for (int i = 1; i <= comp.boundary_type.size(); ++i) comp.boundary_type[i] = kAdBoundaryValue;
   }
   void Set(const std::function<double(double, double)>& c0) {
     for (int e = 1; e <= c.hd.state.nelements; ++e) comp.c[e] = c0(c.mesh.elements.xc[e], c.mesh.elements.yc[e]);

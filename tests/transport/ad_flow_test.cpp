@@ -41,10 +41,12 @@ struct TidalRun {
   double budget_defect = 0.0;  // |mass change - booked| / mass
   long long wet_changes = 0;   // elements that changed between dry and wet
   double drying_total = 0.0;
+  double substeps = 0.0;       // transport sub-steps per HD sub-step
 };
 
+// cfl_ad: CFL_critical_AD; D: dispersion coefficient (m2/s).
 TidalRun RunTidalCycle(CellLayout layout, int hd_order, const AdSolutionTechnique& technique, double c0,
-                       double c_in) {
+                       double c_in, double cfl_ad = 1.0, double D = 0.0) {
   AdCase k;
   const std::string tide = k.dir.file("tide.zrn0");
   WriteSeries(tide, TimeAxis{}, 30.0, 64, [](double t) {
@@ -54,7 +56,9 @@ TidalRun RunTidalCycle(CellLayout layout, int hd_order, const AdSolutionTechniqu
   spec.jitter = 0.15;
   k.Make(spec, hd_order, 60.0, 31, TidalSetup(tide));
   SetFloodDry(k.c.hd, 0.005, 0.05, 0.1);
+  k.c.hd.time_step.CFL_critical_AD = cfl_ad;
   k.Start(technique, [](double, double) { return 0.0; }, [&](double, double) { return c0; });
+  if (D > 0) k.comp.dispersion.assign(k.c.hd.state.nelements, D);
   for (int i = 1; i <= k.comp.boundary_type.size(); ++i) {
     k.comp.boundary_type[i] = kAdBoundaryValue;
     k.comp.boundary_c[i] = c_in;
@@ -77,21 +81,29 @@ TidalRun RunTidalCycle(CellLayout layout, int hd_order, const AdSolutionTechniqu
   const double mass = k.Mass();
   r.budget_defect = std::abs(mass - k.mass0 - k.Booked()) / std::max(mass, k.mass0);
   for (int e = 1; e <= k.c.hd.state.nelements_owned; ++e) r.drying_total += std::abs(k.comp.drying_total[e]);
+  r.substeps = static_cast<double>(k.substeps) / static_cast<double>(k.hd_steps);
   return r;
 }
 
 TEST(TransportFlow, UniformConcentrationStaysUniformThroughFloodingAndDrying) {
   // c = 1 everywhere, in the tide, the sources and the rain: every element
   // keeps 1 to 1e-12 over a whole tidal cycle that floods and dries the
-  // beach, for both HD orders, every time integration and both AD orders.
+  // beach, for both HD orders, every time integration and both AD orders;
+  // the last row, with dispersion and a small CFL_critical_AD, splits the
+  // HD sub-steps into several transport sub-steps.
   struct Row {
     int hd_order, time_integration, ad_order;
-  } rows[] = {{1, 1, 1}, {1, 3, 2}, {2, 2, 2}, {2, 3, 2}, {2, 1, 1}};
+    double cfl_ad, D;
+  } rows[] = {{1, 1, 1, 1.0, 0.0}, {1, 3, 2, 1.0, 0.0}, {2, 2, 2, 1.0, 0.0},
+              {2, 3, 2, 1.0, 0.0}, {2, 1, 1, 1.0, 0.0}, {2, 3, 2, 0.05, 5.0}};
   for (const Row& row : rows) {
     SCOPED_TRACE("HD order " + std::to_string(row.hd_order) + ", AD scheme " + std::to_string(row.time_integration) +
-                 "/" + std::to_string(row.ad_order));
-    const TidalRun r =
-        RunTidalCycle(CellLayout::kMixed, row.hd_order, Technique(row.time_integration, row.ad_order), 1.0, 1.0);
+                 "/" + std::to_string(row.ad_order) + ", CFL_critical_AD " + std::to_string(row.cfl_ad));
+    const TidalRun r = RunTidalCycle(CellLayout::kMixed, row.hd_order, Technique(row.time_integration, row.ad_order),
+                                     1.0, 1.0, row.cfl_ad, row.D);
+    if (row.cfl_ad < 1.0) {
+      EXPECT_GT(r.substeps, 1.5);
+    }
     EXPECT_LT(r.deviation, 1e-12);
     EXPECT_GT(r.wet_changes, 20);  // the beach did flood and dry
     EXPECT_LT(r.budget_defect, 1e-12);
