@@ -30,6 +30,7 @@ class HdDriverModule final : public Module {
   // For a module that changes the flow state between HD steps (the sand
   // transport moves the bed), and the mesh the state lives on.
   HdModule& mutable_hd() { return hd_; }
+  const HdSolver& solver() const { return solver_; }
   const Mesh& mesh() const { return *mesh_; }
 
  private:

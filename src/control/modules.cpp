@@ -5,6 +5,7 @@
 #include "control/module.hpp"
 #include "control/pt_driver_module.hpp"
 #include "control/st_driver_module.hpp"
+#include "control/tr_driver_module.hpp"
 #include "io/setup.hpp"
 #include "log/log.hpp"
 
@@ -60,6 +61,8 @@ std::unique_ptr<Module> CreateModule(ModuleKind kind, int mode) {
       return std::make_unique<StDriverModule>();
     case ModuleKind::PT:
       return std::make_unique<PtDriverModule>(mode);
+    case ModuleKind::TR:
+      return std::make_unique<TrDriverModule>();
     default:
       return nullptr;
   }
@@ -71,7 +74,9 @@ std::string ModuleSectionName(ModuleKind kind) {
   return name;
 }
 
-void SetupModules(ModuleSet& modules, const ModuleContext& context) {
+void SetupModules(ModuleSet& modules, const ModuleContext& run_context) {
+  ModuleContext context = run_context;
+  context.modules = &modules;
   for (const ModuleKind kind : kSetupOrder) {
     const int mode = ModuleMode(context.selection, kind);
     if (mode <= 0) {
@@ -90,9 +95,7 @@ void SetupModules(ModuleSet& modules, const ModuleContext& context) {
       FatalError("MODULE_SELECTION: " + std::string(ModuleModeKeyword(kind)) + " = " +
                  std::to_string(mode) + ": the " + std::string(ModuleTitle(kind)) +
                  " module is not available in this build");
-    ModuleContext own = context;
-    own.modules = &modules;
-    module->Setup(own);
+    module->Setup(context);
     modules.Set(kind, std::move(module));
   }
 }

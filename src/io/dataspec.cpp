@@ -70,8 +70,15 @@ void ReadFileName(DataSpec& spec) {
 
 void ReadDataSpec(DataSpec& spec, int n, const std::vector<double>& default_values,
                   const std::vector<int>& default_items) {
+  ReadDataSpec(spec, n, {}, std::string(), default_values, default_items);
+}
+
+void ReadDataSpec(DataSpec& spec, int n, std::span<const int> formats, const std::string& format_message,
+                  const std::vector<double>& default_values, const std::vector<int>& default_items) {
   InitDataSpec(spec, n, default_values, default_items);
   SktReadKeyword("format", spec.format, kDataConstant);
+  if (!formats.empty() && std::find(formats.begin(), formats.end(), spec.format) == formats.end())
+    FatalError(format_message + " (format = " + std::to_string(spec.format) + " in " + SktSectionPath() + ")");
   switch (spec.format) {
     case kDataConstant:
       ReadComponents("constant_value", "constant_values", spec.constant_values);

@@ -118,6 +118,12 @@ void InitDataSpec(DataSpec& spec, int n, const std::vector<double>& default_valu
 void ReadDataSpec(DataSpec& spec, int n, const std::vector<double>& default_values = {},
                   const std::vector<int>& default_items = {});
 
+// The same, for a quantity that allows only the given formats: any other
+// format stops the run with format_message, followed by the format and the
+// section. Empty formats: every format of a data input.
+void ReadDataSpec(DataSpec& spec, int n, std::span<const int> formats, const std::string& format_message,
+                  const std::vector<double>& default_values = {}, const std::vector<int>& default_items = {});
+
 // Soft-start factor at time t for a soft start type and interval T.
 double SoftStartFactor(int type, double interval, double t);
 inline double SoftStartFactor(const DataSpec& spec, double t) {

@@ -232,6 +232,9 @@ void ReadOutput(OutputSpec& spec, OutputList& list, const OutputModuleInfo& info
       BudgetItems(spec);
       break;
     case kOutputDischarge:
+      if (!info.discharge)
+        FatalError(routine + ": Output type not supported - type 4 (a discharge is an output of the flow)" +
+                   Where(spec));
       ReadDischargeItems(spec);
       if (spec.items.empty()) FatalError(routine + ": No items selected in " + spec.section + "/DISCHARGE");
       break;

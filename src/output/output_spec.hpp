@@ -160,6 +160,7 @@ struct OutputModuleInfo {
   OutputItemReader read_items = nullptr;      // type 1
   void* context = nullptr;
   std::vector<std::string> budget_components; // components of mass budgets, in module order
+  bool discharge = true;                      // offers discharge outputs (type 4)
 };
 
 // Reads the OUTPUTS section inside the current section (the module's own):
