@@ -45,7 +45,7 @@ NodeWeights WeightsAt(const Mesh& mesh, double x, double y, int e) {
   NodeWeights nw;
   const ElementTable& el = mesh.elements;
   nw.n = std::min(ElementNodeCount(el, e), 4);
-  double px[4], py[4];
+  double px[4] = {}, py[4] = {};
   for (int j = 0; j < nw.n; ++j) {
     nw.node[j] = ElementNode(el, e, j + 1);
     px[j] = mesh.nodes.x[nw.node[j]] - mesh.nodes.x[nw.node[0]];

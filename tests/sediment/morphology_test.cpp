@@ -91,7 +91,9 @@ TEST(Morphology, SandIsConservedInAClosedBasin) {
       const HdState& s = c.hd.state;
       for (int e = 1; e <= s.nelements_owned; ++e) {
         ASSERT_GE(s.h[e], 0.0);
-        if (s.wetdry[e] > 0) ASSERT_NEAR(s.h[e], s.eta[e] + s.d[e], 1e-12);
+        if (s.wetdry[e] > 0) {
+          ASSERT_NEAR(s.h[e], s.eta[e] + s.d[e], 1e-12);
+        }
       }
     }
   }
