@@ -218,7 +218,7 @@ TEST(ForcingSetup, CoriolisParameterFromTheLatitude) {
   }
 }
 
-// The built-in constituents at a date and place against the Part's
+// The built-in constituents at a date and place against the equilibrium-tide
 // formulas, evaluated here on their own.
 TEST(ForcingTide, BuiltinEquilibriumTideMatchesTheFormulas) {
   EXPECT_DOUBLE_EQ(DaysFromTideEpoch(1900, 1, 1, 0, 0, 0), 0.5);
