@@ -6,6 +6,7 @@
 // modules build on it and state their cost relative to its step.
 
 #include <cmath>
+#include <functional>
 #include <memory>
 
 #include "hydro/hd_module.hpp"
@@ -22,7 +23,10 @@ struct HdCase {
   HdSolver solver;
 };
 
-inline std::unique_ptr<HdCase> MakeHdCase(int elements, int order) {
+// prepare, when given, adds settings to the module once its state is
+// allocated and before the solver is set up (forcings, sources).
+inline std::unique_ptr<HdCase> MakeHdCase(
+    int elements, int order, const std::function<void(HdModule&, const Mesh&)>& prepare = {}) {
   auto c = std::make_unique<HdCase>();
   RectangleMeshSpec spec;
   const int n = static_cast<int>(std::lround(std::sqrt(elements / 2.0)));
@@ -55,6 +59,7 @@ inline std::unique_ptr<HdCase> MakeHdCase(int elements, int order) {
     st.eta[e] = 0.1 * std::sin(c->mesh.elements.xc[e] / spec.x1 * 6.283);
     st.h[e] = st.eta[e] + st.d[e];
   }
+  if (prepare) prepare(hd, c->mesh);
   InitialFloodDryCodesHD(hd, c->mesh);
   SetupSolverHD(hd, c->mesh, c->solver);
   InitialStepHD(hd, c->solver, c->mesh);

@@ -15,6 +15,7 @@
 #include <string>
 
 #include "core/omp.hpp"
+#include "hd_case.hpp"
 #include "hydro/hd_module.hpp"
 #include "hydro/sw_fluxes.hpp"
 #include "hydro/time_step.hpp"
@@ -26,12 +27,6 @@
 namespace {
 
 using namespace vhd;
-
-struct Case {
-  Mesh mesh;
-  HdModule hd;
-  HdSolver solver;
-};
 
 // Rain of 100 mm/h and evaporation of 10 mm/h; 100 sources on a 10 x 10
 // grid over the basin: 60 inflows of 1 m3/s, 20 sinks of 0.5 m3/s and 10
@@ -61,47 +56,24 @@ std::string ForcingSetup(double size) {
   return s;
 }
 
-std::unique_ptr<Case> MakeCase(int elements, bool forcing) {
-  auto c = std::make_unique<Case>();
-  RectangleMeshSpec spec;
-  const int n = static_cast<int>(std::lround(std::sqrt(elements / 2.0)));
-  spec.nx = spec.ny = n;
-  spec.x1 = spec.y1 = n * 10.0;
-  spec.layout = CellLayout::kRandomTriangles;
-  spec.jitter = 0.2;
-  spec.bed = [](double x, double) { return -5.0 - 1e-4 * x; };
-  GenerateRectangleMesh(spec, c->mesh);
-  SetupMeshGeometry(c->mesh);
-  HdModule& hd = c->hd;
-  hd.bed.type = kBedNone;
-  hd.eddy.horizontal.type = kEddyNone;
-  hd.time_step.dt_max_HD = 1e9;
-  hd.time_step.CFL_critical_HD = 0.8;
-  hd.flood_dry.elevation_limit = 1e6;
-  hd.solution.type_of_Riemann_solver = 1;
-  hd.time_axis.last_step = 1000000;
-  AllocateStateHD(hd, c->mesh);
-  HdState& st = hd.state;
-  for (int e = 1; e <= st.nelements; ++e) {
-    st.eta[e] = 0.1 * std::sin(c->mesh.elements.xc[e] / spec.x1 * 6.283);
-    st.h[e] = st.eta[e] + st.d[e];
-  }
-  if (forcing) {
+// The shared first-order basin, with the rain, evaporation and sources
+// above when forcing is on.
+std::unique_ptr<bench::HdCase> MakeCase(int elements, bool forcing) {
+  return bench::MakeHdCase(elements, 1, [forcing](HdModule& hd, const Mesh& mesh) {
+    hd.time_axis.last_step = 1000000;
+    if (!forcing) return;
+    const double size = 10.0 * std::lround(std::sqrt(mesh.elements.nelements / 2.0));  // basin side (m)
     const std::string path = (std::filesystem::temp_directory_path() / "bench_sources.toml").string();
-    std::ofstream(path) << "[VantorHD]\n[VantorHD.HYDRODYNAMIC_MODULE]\n" << ForcingSetup(spec.x1);
+    std::ofstream(path) << "[VantorHD]\n[VantorHD.HYDRODYNAMIC_MODULE]\n" << ForcingSetup(size);
     SktOpenFile(path, false);
     SktOpenTarget("VantorHD");
     SktOpenSection("HYDRODYNAMIC_MODULE", kNoIndex, nullptr, false);
-    SetupPrecipitationHD(hd, c->mesh);
-    SetupSourcesHD(hd, c->mesh);
+    SetupPrecipitationHD(hd, mesh);
+    SetupSourcesHD(hd, mesh);
     SktCloseSection();
     SktClose();
     std::filesystem::remove(path);
-  }
-  InitialFloodDryCodesHD(hd, c->mesh);
-  SetupSolverHD(hd, c->mesh, c->solver);
-  InitialStepHD(hd, c->solver, c->mesh);
-  return c;
+  });
 }
 
 void BM_HdStepForcing(benchmark::State& state) {
